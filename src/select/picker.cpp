@@ -1,0 +1,1 @@
+// Placeholder: filled as the part lands.
