@@ -1,6 +1,9 @@
 // Host record files: a plain run of fixed-length records, numbered from 1, read shared and
-// never written. The file is mapped (or read in large blocks) once; records are views into
-// it, so reading a record allocates nothing.
+// never written or locked (the host accounting system may have them open meanwhile). Records
+// are read through a window of whole records that is refilled with one positioned read when
+// a record leaves it, so a sequential scan reads in large blocks and allocates nothing per
+// record. The file is not mapped: a host that truncates the file during a scan makes the
+// missing records read as empty instead of faulting.
 #pragma once
 
 #include <cstddef>
@@ -18,19 +21,21 @@ class HostFileError : public std::runtime_error {
   using std::runtime_error::runtime_error;
 };
 
-// Looks up `name` in `folder` without regard to case ("ACT.fix", "ACT.FIX" and "act.fix" are
-// the same file). An exact match wins; otherwise the first entry whose name matches
-// case-insensitively. Returns nothing when there is none or the folder cannot be listed.
+// Looks up the file `name` in `folder` without regard to ASCII case ("ACT.fix", "ACT.FIX" and
+// "act.fix" are the same file). An exact match wins; otherwise, of the entries whose names
+// match case-insensitively, the one that sorts first by bytes (so the choice does not depend
+// on the directory's listing order). Folders are never matched. A leading "\" or "/" on
+// `name` (the host's "\ACT.fix" form) is ignored. Returns nothing when there is no such file
+// or the folder cannot be listed.
 std::optional<std::filesystem::path> FindFileNoCase(const std::filesystem::path& folder,
                                                     std::string_view name);
 
 class HostRecordFile {
  public:
-  // Opens `folder`/`name` (name matched without regard to case) for reading records of
-  // `recordLength` bytes. Throws HostFileError with a readable message when the file is
-  // missing or cannot be read.
-  HostRecordFile(const std::filesystem::path& folder, std::string_view name,
-                 size_t recordLength);
+  // Opens `folder`/`name` (name found by FindFileNoCase) for reading records of
+  // `recordLength` bytes (at least 1). Throws HostFileError with a message naming the file
+  // when it is missing or cannot be read. The length is taken once, at opening.
+  HostRecordFile(const std::filesystem::path& folder, std::string_view name, size_t recordLength);
   // Opens an exact path.
   HostRecordFile(const std::filesystem::path& path, size_t recordLength);
   ~HostRecordFile();
@@ -46,21 +51,28 @@ class HostRecordFile {
   const std::filesystem::path& Path() const { return path_; }
 
   // The bytes of record n (1-based). Returns an empty view when record n is not wholly in
-  // the file (beyond the end, or the partial last record), so a partial record is never
-  // read as if whole. The view lives as long as this object.
+  // the file (n < 1, beyond the end, the partial last record, or a record the host cut off
+  // since the file was opened), so a partial record is never read as if whole. The view is
+  // valid until the next call of Record on this object. Throws HostFileError on a read
+  // error. Not safe for concurrent use of one object.
   std::string_view Record(int64_t n) const;
 
  private:
   void OpenPath(const std::filesystem::path& path);
+  bool Fill(int64_t n) const;
 
   std::filesystem::path path_;
   size_t recLen_;
   uint64_t size_ = 0;
-  const char* data_ = nullptr;
   int fd_ = -1;
+  // The window: records winFirst_ .. winFirst_ + winCount_ - 1 are in window_.
+  mutable std::string window_;
+  mutable int64_t winFirst_ = 0;
+  mutable int64_t winCount_ = 0;
 };
 
-// Round to nearest, halves to even (the host's conversion of a count to a record number).
+// Round to nearest, halves to even (the host's conversion of a count to a record number),
+// whatever the floating-point rounding mode. NaN gives 0; values beyond int64 saturate.
 int64_t RoundHalfEven(double x);
 
 }  // namespace zdr
