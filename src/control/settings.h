@@ -1,0 +1,167 @@
+// The per-user settings store and the routines that move the panel, the company path, the
+// label appearance and the dispatch settings to and from it.
+//
+// Every value is a UTF-8 string addressed by application, section and key. For the
+// routines below, action 1 saves and action 2 loads; any other action does nothing.
+#pragma once
+
+#include <cstdint>
+#include <map>
+#include <stdexcept>
+#include <string>
+#include <string_view>
+#include <tuple>
+#include <vector>
+
+#include "control/panel.h"
+#include "output/outputdefs.h"
+
+namespace zdr {
+
+inline constexpr std::string_view kSettingsApp = "ZDRLab";
+inline constexpr std::string_view kParamsSection = "Params";
+inline constexpr std::string_view kConnDataBaseKey = "ConnDataBase";
+inline constexpr std::string_view kLabPicsSection = "LabPics";
+inline constexpr std::string_view kPostILSection = "PostIL";
+
+inline constexpr uint8_t kActionSave = 1;
+inline constexpr uint8_t kActionLoad = 2;
+
+// The kinds of control value SetGetRegValue moves.
+inline constexpr uint8_t kKindText = 1;   // a text box's text, as typed
+inline constexpr uint8_t kKindList = 2;   // a combo box's list index, "-1" for no entry
+inline constexpr uint8_t kKindCheck = 3;  // a check box's value: "0", "1" or "2" (greyed)
+
+// The entries of the panel's combo boxes, which a stored list index must fit.
+inline constexpr int kDocTypeListSize = 28;
+inline constexpr int kByDocListSize = 2;
+inline constexpr int kSortByListSize = 8;
+inline constexpr int kSortDirListSize = 2;
+inline constexpr int kInAccountsListSize = 2;
+inline constexpr int kAddressFromListSize = 2;
+
+// Where values are kept. Implementations: MemorySettingsStore (below) and QtSettingsStore
+// (control/qtsettings.h).
+class SettingsStore {
+ public:
+  virtual ~SettingsStore() = default;
+
+  // The value stored under app/section/key, or `defaultValue` when there is none.
+  virtual std::string Get(std::string_view app, std::string_view section, std::string_view key,
+                          std::string_view defaultValue) = 0;
+
+  // Stores `value` under app/section/key, replacing any earlier value. Throws
+  // SettingsStoreError when the store cannot be written.
+  virtual void Save(std::string_view app, std::string_view section, std::string_view key,
+                    std::string_view value) = 0;
+};
+
+// The store could not be written (for example a read-only settings file).
+class SettingsStoreError : public std::runtime_error {
+ public:
+  using std::runtime_error::runtime_error;
+};
+
+// A stored value that its control refuses: a list index outside the list, a non-number
+// for a list index or a check value, a check value other than 0, 1 or 2. what() is a
+// Hebrew message naming the key and the value.
+class SettingsValueError : public std::runtime_error {
+ public:
+  SettingsValueError(std::string key, std::string value);
+  const std::string& key() const { return key_; }
+  const std::string& value() const { return value_; }
+
+ private:
+  std::string key_;
+  std::string value_;
+};
+
+// A store in memory, for tests and for running without a per-user store. Keeps every
+// value and a log of every save in order.
+class MemorySettingsStore : public SettingsStore {
+ public:
+  struct Saved {
+    std::string app, section, key, value;
+  };
+  using Address = std::tuple<std::string, std::string, std::string>;  // app, section, key
+
+  std::string Get(std::string_view app, std::string_view section, std::string_view key,
+                  std::string_view defaultValue) override;
+  void Save(std::string_view app, std::string_view section, std::string_view key,
+            std::string_view value) override;
+
+  // Every stored value, ordered by address.
+  const std::map<Address, std::string>& Values() const { return values_; }
+  // Every Save call since construction or the last ClearLog(), in call order.
+  const std::vector<Saved>& SaveLog() const { return log_; }
+  void ClearLog() { log_.clear(); }
+  // True when a value is stored under the address.
+  bool Has(std::string_view app, std::string_view section, std::string_view key) const;
+  // Forgets one value; a later Get returns its default.
+  void Remove(std::string_view app, std::string_view section, std::string_view key);
+
+ private:
+  std::map<Address, std::string> values_;
+  std::vector<Saved> log_;
+};
+
+// One control's value as SetGetRegValue moves it: a text, a list index with the number
+// of entries in its list, or a check value. Refers to the value; does not own it.
+class ControlValueRef {
+ public:
+  static ControlValueRef Text(std::string& text) { return ControlValueRef(&text, nullptr, 0); }
+  static ControlValueRef ListIndex(int& index, int listSize) {
+    return ControlValueRef(nullptr, &index, listSize);
+  }
+  static ControlValueRef CheckValue(int& value) { return ControlValueRef(nullptr, &value, -1); }
+
+  std::string* text() const { return text_; }
+  int* number() const { return number_; }
+  bool isList() const { return number_ != nullptr && listSize_ >= 0; }
+  int listSize() const { return listSize_; }
+
+ private:
+  ControlValueRef(std::string* text, int* number, int listSize)
+      : text_(text), number_(number), listSize_(listSize) {}
+  std::string* text_;
+  int* number_;
+  int listSize_;  // -1 for a check value
+};
+
+// Moves one control's value. Action 1 stores its text form by `kind`; action 2 reads the
+// setting (`defaultValue` when missing) and assigns it. Any other action or kind does
+// nothing. On load, throws SettingsValueError for a value the control refuses and leaves
+// the control as it was; throws std::invalid_argument when `value` is not of `kind`'s sort.
+void SetGetRegValue(uint8_t action, SettingsStore& store, std::string_view app,
+                    std::string_view section, std::string_view key, ControlValueRef value,
+                    uint8_t kind, std::string_view defaultValue);
+
+// The keys of section Params, in the order SetGetRegParams moves them.
+std::vector<std::string> ParamsKeys();
+
+// Saves or loads the whole panel under ZDRLab/Params, key by key in the fixed order. A
+// failure ends the pass at that key by throwing (SettingsValueError on load,
+// SettingsStoreError on save); the keys after it are not moved. Callers ignore it.
+void SetGetRegParams(uint8_t action, SettingsStore& store, Panel& panel);
+
+// The company path used when none is stored: "c:\ztest" on Windows, the folder `ztest` in
+// the user's home folder elsewhere.
+std::string DefaultConnDataBase();
+
+// Saves or loads the company path (ZDRLab/Params/ConnDataBase, default
+// DefaultConnDataBase()). Errors are ignored.
+void SetGetRegConnParams(uint8_t action, SettingsStore& store, std::string& connDataBase);
+
+// Saves or loads the label appearance: sections LabelDef0..LabelDef7 (Font, FontSize,
+// FontWeight, FontUL, FontItalic; defaults 0, 9, 0, 0, 0) and LabPics (Pic0, Pic1; default
+// empty). Line 8 is not moved. Errors are ignored value by value: a stored value that is
+// not a whole number from 0 to 255 leaves the old one.
+void SetGetRegLabelDefs(uint8_t action, SettingsStore& store, LabelSettings& labels);
+
+// Saves or loads the dispatch settings in section PostIL, keys Service, Weight, Confirm,
+// FilePath, OpenExcel, FileFormat in that order (texts default empty, integers 0). Errors
+// are ignored value by value: a stored integer that is not a 16-bit whole number leaves
+// the old one.
+void SetGetRegPostILDefs(uint8_t action, SettingsStore& store, PostILSettings& postIL);
+
+}  // namespace zdr
