@@ -1,1 +1,397 @@
-// Placeholder: filled as the part lands.
+#include "import/hosttext.h"
+
+#include <unicode/ubidi.h>
+#include <unicode/utypes.h>
+
+#include <algorithm>
+#include <limits>
+#include <vector>
+
+#include "import/codepage.h"
+
+namespace zdr {
+namespace {
+
+constexpr unsigned char kWinAlef = 0xE0;
+constexpr unsigned char kWinTav = 0xFA;
+constexpr unsigned char kHostToWinLetter = 0x60;
+
+inline unsigned char Byte(char c) {
+  return static_cast<unsigned char>(c);
+}
+
+inline char MapHebrew(unsigned char b) {
+  return static_cast<char>(b + kHostToWinLetter);
+}
+
+inline bool IsAsciiLetter(unsigned char b) {
+  return (b >= 'A' && b <= 'Z') || (b >= 'a' && b <= 'z');
+}
+
+// Text shown to the user inside an error message: Windows-1255 bytes made readable.
+std::string Quoted(std::string_view s) {
+  return "\"" + Win1255ToUtf8(s) + "\"";
+}
+
+// A result built from both ends: `front` holds, reversed, what was put in front; `back`
+// what was appended. Keeps each step O(1).
+struct TwoEnded {
+  std::string front;
+  std::string back;
+
+  void PutInFront(char c) { front.push_back(c); }
+  void Append(char c) { back.push_back(c); }
+  std::string Take() {
+    std::string out(front.rbegin(), front.rend());
+    out += back;
+    return out;
+  }
+};
+
+// The 16-bit integer value of one part of a date.
+int16_t DatePart(std::string_view part, std::string_view whole) {
+  int64_t v;
+  try {
+    v = HostIntValue(part);
+  } catch (const HostTextError&) {
+    throw HostTextError("תאריך לא תקין: " + Quoted(whole));
+  }
+  if (v < std::numeric_limits<int16_t>::min() || v > std::numeric_limits<int16_t>::max()) {
+    throw HostTextError("מספר גדול מדי בתאריך: " + Quoted(whole));
+  }
+  return static_cast<int16_t>(v);
+}
+
+// Display order to reading order through ICU's inverse reordering. The UBiDi object and
+// the buffers live as long as the thread and are reused from call to call.
+class InverseBidi {
+ public:
+  InverseBidi() : bidi_(ubidi_open()) {
+    if (bidi_ != nullptr) ubidi_setReorderingMode(bidi_, UBIDI_REORDER_INVERSE_LIKE_DIRECT);
+  }
+  ~InverseBidi() {
+    if (bidi_ != nullptr) ubidi_close(bidi_);
+  }
+  InverseBidi(const InverseBidi&) = delete;
+  InverseBidi& operator=(const InverseBidi&) = delete;
+
+  // Windows-1255 in display order to Windows-1255 in reading order, same length.
+  std::string Reorder(std::string_view s) {
+    if (bidi_ == nullptr) throw HostTextError("סידור הטקסט הדו-כיווני נכשל (ICU)");
+    in_.resize(s.size());
+    for (size_t i = 0; i < s.size(); ++i) {
+      in_[i] = static_cast<UChar>(Win1255ToCodePoint(Byte(s[i])));
+    }
+    UErrorCode err = U_ZERO_ERROR;
+    ubidi_setPara(bidi_, in_.data(), static_cast<int32_t>(in_.size()), UBIDI_RTL, nullptr, &err);
+    out_.resize(in_.size() + 16);
+    int32_t n = 0;
+    if (U_SUCCESS(err)) {
+      n = ubidi_writeReordered(bidi_, out_.data(), static_cast<int32_t>(out_.size()), 0, &err);
+      if (err == U_BUFFER_OVERFLOW_ERROR) {
+        err = U_ZERO_ERROR;
+        out_.resize(static_cast<size_t>(n));
+        n = ubidi_writeReordered(bidi_, out_.data(), n, 0, &err);
+      }
+    }
+    if (U_FAILURE(err)) {
+      throw HostTextError(std::string("סידור הטקסט הדו-כיווני נכשל: ") + u_errorName(err));
+    }
+    std::string result;
+    result.resize(static_cast<size_t>(n));
+    for (int32_t i = 0; i < n; ++i) {
+      const int b = CodePointToWin1255(out_[static_cast<size_t>(i)]);
+      // Every code unit came from a Windows-1255 byte and reordering without mirroring
+      // adds none of its own, so the byte always exists.
+      result[static_cast<size_t>(i)] = b >= 0 ? static_cast<char>(b) : '?';
+    }
+    return result;
+  }
+
+ private:
+  UBiDi* bidi_ = nullptr;
+  std::vector<UChar> in_;
+  std::vector<UChar> out_;
+};
+
+// Text whose reading order equals its display order under the reordering above: printable
+// ASCII beginning and ending with a Latin letter, or digits alone. (Read from the right, as
+// the reordering reads display order, a number after a neutral at the end would form a run
+// of its own and move.)
+bool ReadsAsStored(std::string_view t) {
+  if (t.empty()) return true;
+  bool allDigits = true;
+  for (const char c : t) {
+    const unsigned char b = Byte(c);
+    if (b < 0x20 || b > 0x7E) return false;
+    if (b < '0' || b > '9') allDigits = false;
+  }
+  if (allDigits) return true;
+  return IsAsciiLetter(Byte(t.front())) && IsAsciiLetter(Byte(t.back()));
+}
+
+}  // namespace
+
+namespace detail {
+
+std::string BidiReorderWithIcu(std::string_view s) {
+  thread_local InverseBidi bidi;
+  return bidi.Reorder(s);
+}
+
+}  // namespace detail
+
+std::string_view TrimSpaces(std::string_view s) {
+  const size_t first = s.find_first_not_of(' ');
+  if (first == std::string_view::npos) return {};
+  const size_t last = s.find_last_not_of(' ');
+  return s.substr(first, last - first + 1);
+}
+
+int64_t HostIntValue(std::string_view s) {
+  const std::string_view t = TrimSpaces(s);
+  size_t i = 0;
+  bool negative = false;
+  if (i < t.size() && (t[i] == '+' || t[i] == '-')) {
+    negative = t[i] == '-';
+    ++i;
+  }
+  uint64_t whole = 0;
+  size_t digits = 0;
+  constexpr uint64_t kLimit = static_cast<uint64_t>(std::numeric_limits<int64_t>::max());
+  for (; i < t.size() && t[i] >= '0' && t[i] <= '9'; ++i, ++digits) {
+    whole = whole * 10 + static_cast<uint64_t>(t[i] - '0');
+    if (whole > kLimit) throw HostTextError("מספר גדול מדי: " + Quoted(t));
+  }
+  // Fraction: only the first digit and whether any other is non-zero decide the rounding.
+  int firstFraction = 0;
+  bool restNonZero = false;
+  if (i < t.size() && t[i] == '.') {
+    ++i;
+    for (size_t k = 0; i < t.size() && t[i] >= '0' && t[i] <= '9'; ++i, ++k, ++digits) {
+      if (k == 0) {
+        firstFraction = t[i] - '0';
+      } else if (t[i] != '0') {
+        restNonZero = true;
+      }
+    }
+  }
+  if (digits == 0 || i != t.size()) throw HostTextError("ערך לא מספרי: " + Quoted(s));
+  // Halves go to the even neighbour, as the host's integer conversion does.
+  if (firstFraction > 5 || (firstFraction == 5 && (restNonZero || whole % 2 == 1))) {
+    ++whole;
+    if (whole > kLimit) throw HostTextError("מספר גדול מדי: " + Quoted(t));
+  }
+  const auto v = static_cast<int64_t>(whole);
+  return negative ? -v : v;
+}
+
+Date ParseHostDate(std::string_view s) {
+  const size_t slash1 = s.find('/');
+  const size_t slash2 = s.size() > 3 ? s.find('/', 3) : std::string_view::npos;
+  // slash2 is at or after the fourth character, slash1 the first one, so slash1 <= slash2;
+  // they must differ for a month to stand between them.
+  if (slash1 == std::string_view::npos || slash2 == std::string_view::npos || slash1 == slash2) {
+    throw HostTextError("תאריך לא תקין: " + Quoted(s));
+  }
+  int year = DatePart(s.substr(slash2 + 1), s);
+  const int month = DatePart(s.substr(slash1 + 1, slash2 - slash1 - 1), s);
+  const int day = DatePart(s.substr(0, slash1), s);
+  if (year >= 80 && year <= 99) year += 1900;
+  if (year < 80) year += 2000;
+  return Date::FromParts(year, month, day);
+}
+
+char ConvertChar(char c) {
+  switch (c) {
+    case '(':
+      return ')';
+    case ')':
+      return '(';
+    case '<':
+      return '>';
+    case '>':
+      return '<';
+    case '[':
+      return ']';
+    case ']':
+      return '[';
+    case '{':
+      return '}';
+    case '}':
+      return '{';
+    default:
+      break;
+  }
+  const unsigned char b = Byte(c);
+  return IsHostHebrew(b) ? MapHebrew(b) : c;
+}
+
+std::string ReverseAndMirror(std::string_view s) {
+  std::string out;
+  out.reserve(s.size());
+  for (auto it = s.rbegin(); it != s.rend(); ++it) out.push_back(ConvertChar(*it));
+  return out;
+}
+
+std::string ReorderHebrewFirst(std::string_view s) {
+  std::string hebrew;
+  std::string restReversed;
+  hebrew.reserve(s.size());
+  restReversed.reserve(s.size());
+  bool inHebrew = false;
+  for (auto it = s.rbegin(); it != s.rend(); ++it) {
+    const unsigned char b = Byte(*it);
+    if (IsHostHebrew(b)) {
+      hebrew.push_back(MapHebrew(b));
+      inHebrew = true;
+    } else if (IsLatinOrDigit(b)) {
+      restReversed.push_back(*it);
+      inHebrew = false;
+    } else {
+      switch (b) {
+        case '"':
+        case '\'':
+        case '(':
+        case ')':
+        case '[':
+        case ']':
+        case '{':
+        case '}':
+          break;
+        default:
+          if (inHebrew) {
+            hebrew.push_back(*it);
+          } else {
+            restReversed.push_back(*it);
+          }
+      }
+    }
+  }
+  hebrew.append(restReversed.rbegin(), restReversed.rend());
+  return hebrew;
+}
+
+std::string ConvertForDisplay(std::string_view s, bool asIs) {
+  const std::string_view t = TrimSpaces(s);
+  return asIs ? ReverseAndMirror(t) : ReorderHebrewFirst(t);
+}
+
+std::string ConvertForSort(std::string_view s) {
+  TwoEnded res;
+  bool inHebrew = false;
+  bool seenLatin = false;
+  for (auto it = s.rbegin(); it != s.rend(); ++it) {
+    char c = *it;
+    if (c == '"') c = '\'';
+    const unsigned char b = Byte(c);
+    if (IsHostHebrew(b)) {
+      res.Append(MapHebrew(b));
+      inHebrew = true;
+    } else if (IsLatinOrDigit(b)) {
+      res.PutInFront(c);
+      inHebrew = false;
+      seenLatin = true;
+    } else if (!inHebrew) {
+      res.PutInFront(c);
+    } else if (!seenLatin) {
+      res.Append(c);
+    }
+  }
+  return res.Take();
+}
+
+std::string ConvertSpaced(std::string_view s) {
+  TwoEnded res;
+  bool inHebrew = false;
+  bool seenLatin = false;
+  for (auto it = s.rbegin(); it != s.rend(); ++it) {
+    const char c = *it;
+    const unsigned char b = Byte(c);
+    if (IsHostHebrew(b)) {
+      res.Append(MapHebrew(b));
+      inHebrew = true;
+    } else if (IsLatinOrDigit(b)) {
+      if (!seenLatin) res.PutInFront(' ');
+      res.PutInFront(c);
+      inHebrew = false;
+      seenLatin = true;
+    } else if (!inHebrew) {
+      res.PutInFront(c);
+    } else if (!seenLatin) {
+      res.Append(c);
+    } else {
+      res.Append(' ');
+    }
+  }
+  return res.Take();
+}
+
+std::string ConvertWithBidi(std::string_view s) {
+  const std::string_view t = TrimSpaces(s);
+  if (t.empty()) return {};
+  thread_local std::string mirrored;
+  mirrored.assign(t);
+  for (char& c : mirrored) c = ConvertChar(c);
+  return BidiReorder(mirrored);
+}
+
+std::string BidiReorder(std::string_view s) {
+  // The field ends at its first zero byte; reordering past it would carry the padding
+  // into the middle of the line.
+  const std::string_view t = TrimSpaces(CutAtNull(s));
+  if (ReadsAsStored(t)) return std::string(t);
+  const std::string reordered = detail::BidiReorderWithIcu(t);
+  return std::string(TrimSpaces(CutAtNull(reordered)));
+}
+
+std::string_view CutAtNull(std::string_view s) {
+  const size_t zero = s.find('\0');
+  return zero == std::string_view::npos ? s : s.substr(0, zero);
+}
+
+std::string ToHostLetter(std::string_view s) {
+  if (s.empty()) throw HostTextError("אין תו להמרה");
+  const unsigned char b = Byte(s.front());
+  if (b >= kWinAlef && b <= kWinTav) return std::string(1, static_cast<char>(b - kHostToWinLetter));
+  return std::string(s);
+}
+
+std::string ExtractHebrewWords(std::string_view s, int16_t n) {
+  if (n <= 0) return {};
+  std::string reversed;
+  reversed.reserve(s.size());
+  bool seenHebrew = false;
+  int counter = 0;
+  for (auto it = s.rbegin(); it != s.rend(); ++it) {
+    const char c = *it;
+    const unsigned char b = Byte(c);
+    if (c == ' ' || c == '-' || c == '.') {
+      if (seenHebrew) {
+        reversed.push_back(c);
+        if (++counter == n) break;
+      }
+    } else if (IsHostHebrew(b)) {
+      reversed.push_back(c);
+      seenHebrew = true;
+    } else if (IsAsciiLetter(b)) {
+      break;
+    }
+  }
+  // The last n characters of the result are the first n put in front.
+  if (reversed.size() > static_cast<size_t>(n)) reversed.resize(static_cast<size_t>(n));
+  return std::string(reversed.rbegin(), reversed.rend());
+}
+
+std::string AlignRight(const std::optional<std::string_view>& v, int16_t n) {
+  if (n < 0) throw HostTextError("רוחב שלילי: " + std::to_string(n));
+  if (!v) return std::string(static_cast<size_t>(n), ' ');
+  if (v->size() > static_cast<size_t>(n)) {
+    throw HostTextError("הערך " + Quoted(*v) + " ארוך מ-" + std::to_string(n) + " תווים");
+  }
+  std::string out(static_cast<size_t>(n) - v->size(), ' ');
+  out += *v;
+  return out;
+}
+
+}  // namespace zdr

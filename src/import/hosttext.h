@@ -14,15 +14,19 @@
 
 namespace zdr {
 
-// Raised by ParseHostDate on a part that is not a number, AlignRight on a value longer than
-// its width, ToHostLetter on the empty text, and BidiReorder when reordering fails.
+// Raised by ParseHostDate on a part that is not a number (or a year, month or day outside
+// -32768..32767), AlignRight on a value longer than its width, ToHostLetter on the empty
+// text, HostIntValue on a text that is not a number, and BidiReorder when reordering fails.
+// what() is a Hebrew message in UTF-8, ready to show.
 class HostTextError : public std::runtime_error {
  public:
   using std::runtime_error::runtime_error;
 };
 
 // Character classes of host bytes.
-inline bool IsHostHebrew(unsigned char b) { return b >= 0x80 && b <= 0x9A; }
+inline bool IsHostHebrew(unsigned char b) {
+  return b >= 0x80 && b <= 0x9A;
+}
 inline bool IsLatinOrDigit(unsigned char b) {
   return (b >= '0' && b <= '9') || (b >= 'A' && b <= 'Z') || (b >= 'a' && b <= 'z');
 }
@@ -31,7 +35,9 @@ inline bool IsLatinOrDigit(unsigned char b) {
 std::string_view TrimSpaces(std::string_view s);
 
 // Day/month/year with one or two digits for day and month and two or four for the year;
-// two-digit years 80..99 are 19xx, below 80 are 20xx. Out-of-range parts carry over.
+// two-digit years 80..99 are 19xx, below 80 are 20xx. Out-of-range parts carry over
+// (30/2/05 is 2 March 2005). The first "/" ends the day, the first "/" from the fourth
+// character on ends the month; without both it throws HostTextError.
 Date ParseHostDate(std::string_view s);
 
 // A date from the host's three bytes: year - 1900, month, day (carrying, as above).
@@ -39,23 +45,51 @@ inline Date HostDateFromBytes(unsigned char y, unsigned char m, unsigned char d)
   return Date::FromParts(1900 + y, m, d);
 }
 
+// Mirror pairs ( ) < > [ ] { } swap; a host Hebrew letter becomes its Windows-1255 letter;
+// any other byte stays.
 char ConvertChar(char c);
+// The bytes from last to first, each through ConvertChar.
 std::string ReverseAndMirror(std::string_view s);
+// All Hebrew first in reading order, then the Latin letters and digits (with what stands
+// among them) in stored order; quotes and brackets are dropped.
 std::string ReorderHebrewFirst(std::string_view s);
+// Trimmed, then ReverseAndMirror when `asIs`, else ReorderHebrewFirst.
 std::string ConvertForDisplay(std::string_view s, bool asIs);
+// The sort key of a field: Latin/digit runs in stored order in front, Hebrew in reading
+// order after them; a double quote counts as an apostrophe. Not trimmed.
 std::string ConvertForSort(std::string_view s);
+// As ConvertForSort, but the Latin/digit part is followed by one space, punctuation within
+// Hebrew after Latin becomes a space, and the double quote stays.
 std::string ConvertSpaced(std::string_view s);
+// Trimmed, mirrored through ConvertChar in place, then BidiReorder. A field of spaces
+// gives the empty text without reordering.
 std::string ConvertWithBidi(std::string_view s);
-// Display order to reading order (Windows-1255 in and out), trimmed.
+// Display order to reading order (Windows-1255 in and out, no mirroring): a right-to-left
+// line reordered as the host's screen showed it. The line ends at its first zero byte; the
+// result is trimmed and as long as the line needs (no length cap). Safe to call from
+// several threads (each keeps its own reordering state).
 std::string BidiReorder(std::string_view s);
+// The text before the first zero byte (a view into `s`).
 std::string_view CutAtNull(std::string_view s);
+// A Windows-1255 Hebrew letter first gives the one host byte of that letter; anything
+// else comes back unchanged. Throws HostTextError on the empty text.
 std::string ToHostLetter(std::string_view s);
+// The Hebrew words at the reading start of a host field (up to `n` word breaks and at most
+// `n` bytes), without digits or punctuation; still host bytes. Stops at an ASCII letter.
+// `n` <= 0 gives the empty text.
 std::string ExtractHebrewWords(std::string_view s, int16_t n);
-// `v` empty optional is null.
+// `v` padded on the left with spaces to `n` bytes; an empty optional (null) gives `n`
+// spaces. Throws HostTextError when `v` is longer than `n` or `n` is negative.
 std::string AlignRight(const std::optional<std::string_view>& v, int16_t n);
 
 // The integer value of a text as the host's routines read it: surrounding spaces ignored,
 // a fractional number rounded (halves to even); throws HostTextError when not a number.
 int64_t HostIntValue(std::string_view s);
+
+namespace detail {
+// BidiReorder's ICU reordering alone, without cutting, trimming or the shortcut for text
+// that reads as stored; for tests that check the shortcut against it.
+std::string BidiReorderWithIcu(std::string_view s);
+}  // namespace detail
 
 }  // namespace zdr
