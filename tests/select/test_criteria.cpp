@@ -6,6 +6,7 @@
 
 #include "import/doctypes.h"
 #include "select/select.h"
+#include "workdb/jetsql.h"
 
 namespace zdr {
 namespace {
@@ -84,6 +85,11 @@ TEST_F(CriteriaTest, DoubleQuoteInCityOrPhoneEndedLiteralEarly) {
   panel_.ChkPhone = 1;
   panel_.txtPhone = "\"04";
   EXPECT_EQ(Build(), std::string(kBase) + " AND tAccount.Telephone LIKE \"\"\"04*\"");
+
+  // The database sees the typed text as one literal.
+  panel_.ChkCity = 1;
+  const std::string sql = db::TranslateJetSql("SELECT AccountKey FROM tAccount" + Build());
+  EXPECT_NE(sql.find("LIKE 'x\" OR 1=1 OR \"*'"), std::string::npos) << sql;
 }
 
 TEST_F(CriteriaTest, HandPickedAccountsNeedThePickerDatabase) {

@@ -7,6 +7,7 @@
 
 #include "import/doctypes.h"
 #include "select/select.h"
+#include "workdb/jetsql.h"
 
 namespace zdr {
 namespace {
@@ -226,6 +227,40 @@ TEST_F(StatementTest, DocumentsOffIgnoresByDocAndDocType) {
             std::string(kAccountColumns) +
                 " FROM tAccount Where (1 > 0) ORDER BY "
                 "tAccount.SortByKey ASC");
+}
+
+}  // namespace
+}  // namespace zdr
+
+namespace zdr {
+namespace {
+
+TEST(StatementTranslationTest, EveryVariantIsAcceptedByTheTranslator) {
+  const DocTypeTable docTypes;
+  for (int docType : {0, 13, kCashReceiptsRow, 27}) {
+    for (int byDoc : {0, 1, -1}) {
+      for (int addressFrom : {0, 1}) {
+        for (int sortBy = -1; sortBy <= 8; ++sortBy) {
+          for (int sortDir : {-1, 0, 1}) {
+            Panel panel;
+            panel.ChkDates = 1;
+            panel.cmbDocType = docType;
+            panel.cmbByDoc = byDoc;
+            panel.cmbAddressFrom = addressFrom;
+            panel.CmbSortBy = sortBy;
+            panel.CmbSortDir = sortDir;
+            panel.ChkCity = 1;
+            panel.TxtCity = "חי\"פה";
+            panel.ChkSelectAccount = 1;
+            panel.ChkJournal = 1;
+            panel.txtFromJournal = "1";
+            const std::string sql = BuildRecipientsStatement(panel, docTypes, "zdracc.DB");
+            EXPECT_NO_THROW(db::TranslateJetSql(sql)) << sql;
+          }
+        }
+      }
+    }
+  }
 }
 
 }  // namespace
