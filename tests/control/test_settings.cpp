@@ -211,7 +211,8 @@ TEST(ParamsTest, StoredValuesTheControlsRefuse) {
       {"UseCatCode", "1.5"}, {"DocType", "28"},    {"DocType", "-2"},
       {"ByDoc", "2"},        {"SortDir", "2"},     {"InAccounts", "2"},
       {"AddressFrom", "2"},  {"SortBy", "8"},      {"SortBy", "x"},
-      {"SortBy", ""},        {"UseLogo1", "1e0"},  {"SortBy", "99999999999999999999"}};
+      {"SortBy", ""},        {"UseLogo1", "1e0"},  {"SortBy", "99999999999999999999"},
+      {"ByDoc", "+-1"},      {"ByDoc", "+"}};
   for (const auto& [key, value] : refused) {
     MemorySettingsStore store;
     Put(store, key, value);
