@@ -34,15 +34,24 @@ std::string Quoted(std::string_view s) {
 }
 
 // A result built from both ends: `front` holds, reversed, what was put in front; `back`
-// what was appended. Keeps each step O(1).
+// what was appended. Keeps each step O(1). One per thread, reused, so a conversion
+// allocates only its result.
 struct TwoEnded {
   std::string front;
   std::string back;
 
+  static TwoEnded& Scratch() {
+    thread_local TwoEnded scratch;
+    scratch.front.clear();
+    scratch.back.clear();
+    return scratch;
+  }
   void PutInFront(char c) { front.push_back(c); }
   void Append(char c) { back.push_back(c); }
-  std::string Take() {
-    std::string out(front.rbegin(), front.rend());
+  std::string Take() const {
+    std::string out;
+    out.reserve(front.size() + back.size());
+    out.append(front.rbegin(), front.rend());
     out += back;
     return out;
   }
@@ -278,7 +287,7 @@ std::string ConvertForDisplay(std::string_view s, bool asIs) {
 }
 
 std::string ConvertForSort(std::string_view s) {
-  TwoEnded res;
+  TwoEnded& res = TwoEnded::Scratch();
   bool inHebrew = false;
   bool seenLatin = false;
   for (auto it = s.rbegin(); it != s.rend(); ++it) {
@@ -302,7 +311,7 @@ std::string ConvertForSort(std::string_view s) {
 }
 
 std::string ConvertSpaced(std::string_view s) {
-  TwoEnded res;
+  TwoEnded& res = TwoEnded::Scratch();
   bool inHebrew = false;
   bool seenLatin = false;
   for (auto it = s.rbegin(); it != s.rend(); ++it) {
@@ -341,8 +350,13 @@ std::string BidiReorder(std::string_view s) {
   // into the middle of the line.
   const std::string_view t = TrimSpaces(CutAtNull(s));
   if (ReadsAsStored(t)) return std::string(t);
-  const std::string reordered = detail::BidiReorderWithIcu(t);
-  return std::string(TrimSpaces(CutAtNull(reordered)));
+  std::string reordered = detail::BidiReorderWithIcu(t);
+  const std::string_view kept = TrimSpaces(CutAtNull(reordered));
+  if (kept.size() != reordered.size()) {
+    const size_t from = static_cast<size_t>(kept.data() - reordered.data());
+    reordered.erase(from + kept.size()).erase(0, from);
+  }
+  return reordered;
 }
 
 std::string_view CutAtNull(std::string_view s) {
