@@ -70,6 +70,13 @@ TEST(ReverseAndMirror, ReversesMapsAndMirrors) {
   EXPECT_EQ(U8(ReverseAndMirror(Host("[ןהכ] <1"))), "1> [כהן]");
 }
 
+TEST(ReverseAndMirror, ZeroAndHighBytesPassThrough) {
+  EXPECT_EQ(ReverseAndMirror(std::string("\x00\x9B\xFF\x80", 4)),
+            std::string("\xE0\xFF\x9B\x00", 4));
+  // Bytes past the Hebrew letters count as Other in the sort key and are not mapped.
+  EXPECT_EQ(ConvertForSort(std::string("\x9B\x80\x00", 3)), std::string("\x00\xE0\x9B", 3));
+}
+
 TEST(ReorderHebrewFirst, HebrewThenRest) {
   EXPECT_EQ(ReorderHebrewFirst("12 \x82\x81\x80"), "\xE0\xE1\xE2 12");
   EXPECT_EQ(ReorderHebrewFirst("(12)"), "12");
