@@ -1,1 +1,239 @@
-// Placeholder: filled as the part lands.
+// The label sheet: one full-height table of rows x columns label cells per printed page,
+// each recipient filling `copies` consecutive cells from the start position on.
+#include <algorithm>
+
+#include "output/output.h"
+#include "select/select.h"
+
+// Recordsets have an EOF() member, which the C library's EOF macro would rewrite.
+#ifdef EOF
+#undef EOF
+#endif
+#include "workdb/engine.h"
+
+namespace zdr {
+namespace {
+
+using output_internal::AppendHtmlEscaped;
+using output_internal::AppendHtmlValue;
+using output_internal::AppendSpreadInCells;
+using output_internal::AppendValueText;
+using output_internal::CodePageFile;
+
+const char* FontName(uint8_t font) {
+  switch (font) {
+    case 1:
+      return "David";
+    case 2:
+      return "Miriam";
+    default:
+      return "Arial (Hebrew)";
+  }
+}
+
+const char* WeightName(uint8_t weight) {
+  switch (weight) {
+    case 1:
+      return "Bolder";
+    case 2:
+      return "Bold";
+    default:
+      return "Normal";
+  }
+}
+
+void WriteStyles(CodePageFile& f, const LabelSettings& labels) {
+  std::string line;
+  for (int i = 0; i <= 7; ++i) {
+    const LabelLineDef& d = labels.LabelDefs[i];
+    line = "       .Line" + std::to_string(i) + " {font-family:" + FontName(d.Font) +
+           "; font-weight:" + WeightName(d.FontWeight) +
+           "; font-size:" + std::to_string(d.FontSize) + "pt" +
+           "; font-style:" + (d.FontItalic == 1 ? "Italic" : "Normal") +
+           (d.FontUL == 1 ? "; text-decoration: underline" : "") + "; color:black;}";
+    f.Line(line);
+  }
+}
+
+void AppendEscapedText(const db::Value& v, std::string& out) {
+  if (const auto* s = std::get_if<std::string>(&v)) {
+    AppendHtmlEscaped(*s, out);
+  } else {
+    AppendValueText(v, out);
+  }
+}
+
+// The field's text for a label line: the word Null for a null value.
+void AppendLineText(const db::Value& v, std::string& out) {
+  if (db::IsNull(v)) {
+    out += "Null";
+  } else {
+    AppendEscapedText(v, out);
+  }
+}
+
+// Column indexes of the fields a label prints.
+struct LabelFields {
+  int name, key, details, address, district, city, zip, telephone;
+
+  explicit LabelFields(const db::Snapshot& rs)
+      : name(rs.FieldIndex("AccountName")),
+        key(rs.FieldIndex("AccountKey")),
+        details(rs.FieldIndex("Details")),
+        address(rs.FieldIndex("Address")),
+        district(rs.FieldIndex("District")),
+        city(rs.FieldIndex("City")),
+        zip(rs.FieldIndex("Zip")),
+        telephone(rs.FieldIndex("Telephone")) {}
+};
+
+class SheetWriter {
+ public:
+  SheetWriter(CodePageFile& f, db::Snapshot& rs, const SheetGeometry& g, const Panel& panel,
+              const LabelSettings& labels)
+      : f_(f), rs_(rs), g_(g), fields_(rs) {
+    for (int i = 0; i < 9; ++i) title_[i] = Panel::On(panel.ChkTitle[i]);
+    for (int i = 0; i < 2; ++i) {
+      logo_[i] = Panel::On(panel.ChkLogo[i]);
+      pic_[i] = "    <tr valign='middle' align='center'><td><img border='0' src='";
+      AppendHtmlEscaped(labels.LabPics[i], pic_[i], true);
+      pic_[i] += "'></td></tr>";
+    }
+    cellOpen_ = "    <td valign='middle' width='" + PercentOfOne(g.cols) + "%' height='" +
+                PercentOfOne(g.rows) + "%' align='center'>";
+  }
+
+  void WritePage(int64_t page) {
+    f_.Line(
+        "<table height='100%' width='100%' border='0' cellpadding='0' cellspacing='0' "
+        "dir='rtl'>");
+    for (int64_t row = 1; row <= g_.rows; ++row) {
+      f_.Line("  <tr valign='middle' align='right'>");
+      for (int64_t col = 1; col <= g_.cols; ++col) {
+        const int64_t position = (row - 1) * g_.cols + col;
+        WriteCell(page == 1 && position < g_.start);
+      }
+      f_.Line("  </tr>");
+    }
+    f_.Line("</table>");
+  }
+
+ private:
+  void WriteCell(bool skipped) {
+    f_.Line(cellOpen_);
+    f_.Line("     <table border='0' cellpadding='1' cellspacing='0' dir='rtl'>");
+    if (!rs_.EOF() && !skipped) {
+      WriteLabel();
+      if (++copy_ == g_.copies) {
+        copy_ = 0;
+        rs_.MoveNext();
+      }
+    } else {
+      f_.Line("    <tr><td nowrap>&nbsp;</td></tr>");
+    }
+    f_.Line("     </table>");
+    f_.Line("    </td>");
+  }
+
+  void TextLine(const char* cls, int field) {
+    line_ = "    <tr class='";
+    line_ += cls;
+    line_ += "' align='right'><td>";
+    AppendLineText(rs_.Field(field), line_);
+    line_ += "</td></tr>";
+    f_.Line(line_);
+  }
+
+  void WriteLabel() {
+    if (logo_[0]) f_.Line(pic_[0]);
+    if (title_[0]) f_.Line("    <tr class='Line0' align='right'><td>לכבוד</td></tr>");
+    if (title_[1]) TextLine("Line1", fields_.name);
+    if (title_[2]) {
+      line_ = "    <tr align='right'><td>";
+      AppendSpreadInCells(rs_.Field(fields_.key), "Line2", line_);
+      line_ += "</td></tr>";
+      f_.Line(line_);
+    }
+    if (title_[3]) TextLine("Line3", fields_.details);
+    if (title_[4]) TextLine("Line4", fields_.address);
+    if (title_[6]) TextLine("Line6", fields_.district);
+    if (title_[5] && title_[8]) {
+      // Joined on one line, a null part counts as empty.
+      line_ = "    <tr class='Line5' align='right'><td>";
+      AppendEscapedText(rs_.Field(fields_.city), line_);
+      line_ += "    ";
+      AppendEscapedText(rs_.Field(fields_.zip), line_);
+      line_ += "</td></tr>";
+      f_.Line(line_);
+    } else if (title_[8]) {
+      TextLine("Line5", fields_.zip);
+    } else if (title_[5]) {
+      TextLine("Line5", fields_.city);
+    }
+    if (title_[7]) {
+      line_ = "    <tr class=Line7 align='right'><td>";
+      AppendHtmlValue(rs_.Field(fields_.telephone), line_);
+      line_ += "</td></tr>";
+      f_.Line(line_);
+    }
+    if (logo_[1]) f_.Line(pic_[1]);
+  }
+
+  CodePageFile& f_;
+  db::Snapshot& rs_;
+  const SheetGeometry& g_;
+  LabelFields fields_;
+  bool title_[9] = {};
+  bool logo_[2] = {};
+  std::string pic_[2];
+  std::string cellOpen_;
+  std::string line_;
+  int64_t copy_ = 0;
+};
+
+}  // namespace
+
+void CreateLabFile(const std::string& pFileName, const std::string& pDBFile, const Panel& panel,
+                   const DocTypeTable& docTypes, const std::string& selectDbPath,
+                   const LabelSettings& labels, UserSeam& ui) {
+  const SheetGeometry g = ReadSheetGeometry(panel, true);
+  const int64_t labelsPerPage = g.rows * g.cols;
+
+  CodePageFile f(pFileName, output_internal::Unmappable::kCharRef);
+  ProgressReporter progress(ui, 1);
+  output_internal::WritePageHead(f);
+  f.Line("<style>");
+  WriteStyles(f, labels);
+  f.Line("</style>");
+  f.Line("</HEAD>");
+  f.Line("<BODY BGCOLOR='#FFFFFF'>");
+
+  db::Database database = db::Database::Open(pDBFile);
+  db::Snapshot rs = database.OpenSnapshot(BuildRecipientsStatement(panel, docTypes, selectDbPath));
+  if (rs.BOF() && rs.EOF()) {
+    // No recipients: the page stops after the BODY line.
+    f.Close();
+    return;
+  }
+  rs.MoveLast();
+  const int64_t count = rs.RecordCount();
+  rs.MoveFirst();
+
+  // A start position below 1 means the first cell; counting it as such keeps the last
+  // recipients from falling off the sheet.
+  const int64_t start = std::max<int64_t>(g.start, 1);
+  const int64_t total = g.copies * (start + count - 1);
+  const int64_t pages = (total + labelsPerPage - 1) / labelsPerPage;
+
+  SheetWriter sheet(f, rs, g, panel, labels);
+  ProgressReporter pageProgress(ui, static_cast<double>(pages));
+  for (int64_t page = 1; page <= pages; ++page) {
+    sheet.WritePage(page);
+    pageProgress.Update(static_cast<double>(page));
+  }
+  f.Line("</BODY>");
+  f.Line("</HTML>");
+  f.Close();
+}
+
+}  // namespace zdr
