@@ -23,17 +23,21 @@ struct sqlite3_stmt;
 namespace zdr::db {
 
 // Error numbers.
-inline constexpr int kErrDuplicateKey = 3022;    // a unique index would repeat a value
-inline constexpr int kErrZeroLength = 3315;      // zero-length string in a text field
-inline constexpr int kErrFieldTooSmall = 3163;   // text longer than the field's width
-inline constexpr int kErrNumericOverflow = 3349; // number outside the field's type
-inline constexpr int kErrSyntax = 3075;          // statement the engine cannot run
-inline constexpr int kErrNoSuchObject = 3078;    // table or query not found
-inline constexpr int kErrCannotOpen = 3024;      // database file missing or unreadable
-inline constexpr int kErrFileExists = 3204;      // create over an existing file
-inline constexpr int kErrNoCurrentRecord = 3021; // field read with no current row
-inline constexpr int kErrNoSuchField = 3265;     // field name not in the recordset
-inline constexpr int kErrEngine = 3000;          // any other engine failure
+inline constexpr int kErrDuplicateKey = 3022;     // a unique index would repeat a value
+inline constexpr int kErrZeroLength = 3315;       // zero-length string in a text field
+inline constexpr int kErrFieldTooSmall = 3163;    // text longer than the field's width
+inline constexpr int kErrNumericOverflow = 3349;  // number outside the field's type
+inline constexpr int kErrSyntax = 3075;           // statement the engine cannot run
+inline constexpr int kErrNoSuchObject = 3078;     // table or query not found
+inline constexpr int kErrCannotOpen = 3024;       // database file missing or unreadable
+inline constexpr int kErrFileExists = 3204;       // create over an existing file
+inline constexpr int kErrNoCurrentRecord = 3021;  // field read with no current row
+inline constexpr int kErrNoSuchField = 3265;      // field name not in the recordset
+inline constexpr int kErrEngine = 3000;           // any other engine failure
+inline constexpr int kErrObjectExists = 3012;     // table, link or query name already taken
+inline constexpr int kErrNotEditing = 3020;       // field set or Update without AddNew
+inline constexpr int kErrNullKey = 3058;          // Null in a field of the primary index
+inline constexpr int kErrTypeConversion = 3421;   // value cannot become the field's type
 
 class EngineError : public std::runtime_error {
  public:
@@ -120,6 +124,11 @@ class TableRecordset {
   std::unique_ptr<Impl> impl_;
 };
 
+// The C library's EOF macro would rewrite the EOF() member below; this header hides it only
+// while it declares the member. Files that call EOF() undefine the macro themselves.
+#pragma push_macro("EOF")
+#undef EOF
+
 // The rows of a statement, read whole when it is opened.
 class Snapshot {
  public:
@@ -149,6 +158,8 @@ class Snapshot {
   explicit Snapshot(std::unique_ptr<Impl> impl);
   std::unique_ptr<Impl> impl_;
 };
+
+#pragma pop_macro("EOF")
 
 class Database {
  public:
