@@ -4,6 +4,7 @@
 #include <unicode/ustring.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <cstdio>
 #include <cstring>
 #include <memory>
@@ -77,50 +78,6 @@ void PutDate(std::string& rec, size_t offset, HostDate d) {
 void PutLE(std::string& rec, size_t offset, uint64_t v, size_t width) {
   for (size_t i = 0; i < width; ++i) rec[offset + i] = static_cast<char>((v >> (8 * i)) & 0xFF);
 }
-
-// Large-buffer sequential writer: the big company's files run to hundreds of megabytes.
-class FileWriter {
- public:
-  explicit FileWriter(const std::filesystem::path& path) : path_(path) {
-    if (path.has_parent_path()) std::filesystem::create_directories(path.parent_path());
-    file_ = std::fopen(path.c_str(), "wb");
-    if (!file_) Fail();
-    buf_.reserve(kBuffer);
-  }
-  ~FileWriter() {
-    if (file_) std::fclose(file_);
-  }
-  FileWriter(const FileWriter&) = delete;
-  FileWriter& operator=(const FileWriter&) = delete;
-
-  void Add(std::string_view bytes) {
-    buf_.append(bytes);
-    if (buf_.size() >= kBuffer) Flush();
-  }
-  void Close() {
-    Flush();
-    if (std::fclose(file_) != 0) {
-      file_ = nullptr;
-      Fail();
-    }
-    file_ = nullptr;
-  }
-
- private:
-  static constexpr size_t kBuffer = 4 << 20;
-  void Flush() {
-    if (!buf_.empty() && std::fwrite(buf_.data(), 1, buf_.size(), file_) != buf_.size()) Fail();
-    buf_.clear();
-  }
-  [[noreturn]] void Fail() {
-    throw std::runtime_error("cannot write " + path_.string() + ": " +
-                             std::generic_category().message(errno));
-  }
-
-  std::filesystem::path path_;
-  std::FILE* file_ = nullptr;
-  std::string buf_;
-};
 
 }  // namespace
 
@@ -277,8 +234,55 @@ std::string CompanyRecord(std::string_view name) {
   return r;
 }
 
+namespace {
+constexpr size_t kWriteBuffer = size_t{4} << 20;
+}  // namespace
+
+RecordWriter::RecordWriter(const std::filesystem::path& file) : path_(file) {
+  if (file.has_parent_path()) {
+    std::error_code ec;
+    std::filesystem::create_directories(file.parent_path(), ec);
+    if (ec) {
+      throw std::runtime_error("cannot create " + file.parent_path().string() + ": " +
+                               ec.message());
+    }
+  }
+  file_ = std::fopen(file.c_str(), "wb");
+  if (!file_) Fail();
+  buf_.reserve(kWriteBuffer);
+}
+
+RecordWriter::~RecordWriter() {
+  if (!file_) return;
+  if (!buf_.empty()) std::fwrite(buf_.data(), 1, buf_.size(), file_);
+  std::fclose(file_);
+}
+
+void RecordWriter::Add(std::string_view record) {
+  buf_.append(record);
+  if (buf_.size() >= kWriteBuffer) Flush();
+}
+
+void RecordWriter::Flush() {
+  if (!file_) throw std::runtime_error("writing to closed file " + path_.string());
+  if (!buf_.empty() && std::fwrite(buf_.data(), 1, buf_.size(), file_) != buf_.size()) Fail();
+  buf_.clear();
+}
+
+void RecordWriter::Close() {
+  Flush();
+  std::FILE* f = file_;
+  file_ = nullptr;
+  if (std::fclose(f) != 0) Fail();
+}
+
+void RecordWriter::Fail() {
+  throw std::runtime_error("cannot write " + path_.string() + ": " +
+                           std::generic_category().message(errno));
+}
+
 void WriteRecords(const std::filesystem::path& file, const std::vector<std::string>& records) {
-  FileWriter out(file);
+  RecordWriter out(file);
   for (const std::string& r : records) out.Add(r);
   out.Close();
 }

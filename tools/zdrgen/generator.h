@@ -14,6 +14,7 @@
 #include <array>
 #include <cstddef>
 #include <cstdint>
+#include <cstdio>
 #include <filesystem>
 #include <string>
 #include <string_view>
@@ -148,6 +149,28 @@ std::string CompanyRecord(std::string_view name);
 // Writes the records one after another to `file` (replacing it); creates missing folders.
 // Throws std::runtime_error naming the file when it cannot be written.
 void WriteRecords(const std::filesystem::path& file, const std::vector<std::string>& records);
+
+// Streams records to a file (replacing it, creating missing folders) through a large buffer,
+// for files of hundreds of megabytes. Add and Close throw std::runtime_error naming the file
+// when it cannot be written; a writer destroyed without Close flushes what it can, silently.
+class RecordWriter {
+ public:
+  explicit RecordWriter(const std::filesystem::path& file);
+  ~RecordWriter();
+  RecordWriter(const RecordWriter&) = delete;
+  RecordWriter& operator=(const RecordWriter&) = delete;
+
+  void Add(std::string_view record);
+  void Close();
+
+ private:
+  void Flush();
+  [[noreturn]] void Fail();
+
+  std::filesystem::path path_;
+  std::FILE* file_ = nullptr;
+  std::string buf_;
+};
 
 // ---------------------------------------------------------------------------------------
 // Sample companies.
