@@ -9,7 +9,7 @@
 #include <string>
 #include <vector>
 
-// <cstdio>'s EOF macro would swallow Snapshot::EOF().
+// Declared with <cstdio>'s EOF macro out of the way (Snapshot::EOF()).
 #pragma push_macro("EOF")
 #undef EOF
 #include "workdb/engine.h"

@@ -4,8 +4,14 @@
 
 #include <filesystem>
 #include <string>
+#include <vector>
 
 #include "control/userseam.h"
+// Declared with <cstdio>'s EOF macro out of the way (Snapshot::EOF()).
+#pragma push_macro("EOF")
+#undef EOF
+#include "workdb/engine.h"
+#pragma pop_macro("EOF")
 
 namespace zdr {
 
@@ -13,8 +19,19 @@ inline constexpr const char* kHebrewLocale = ";LANGID=0x040D;CP=1255;COUNTRY=0";
 inline constexpr const char* kWorkDbName = "zdrlab.DB";
 inline constexpr const char* kSelectDbName = "zdracc.DB";
 
+// The tables of the working database in creation order, each with its fields and indexes
+// (tSelectAccount, which is linked, is not among them).
+std::vector<db::TableDef> WorkDbTables();
+
+// The one table of the account-selection database.
+db::TableDef SelectAccountTable();
+
+// The SQL text of the stored query qHeadByItem: the headers that have a line whose item is
+// in tItem, each once.
+std::string HeadByItemSql();
+
 // The temporary folder: the `Temp` environment variable when set and not empty, else the
-// system's temporary folder.
+// system's temporary folder. Empty when neither exists: there is then no place to write.
 std::filesystem::path TempFolder();
 
 // Deletes an old zdrlab.DB in the temporary folder and creates it anew with every table,
