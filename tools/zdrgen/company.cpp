@@ -12,6 +12,7 @@
 #include <algorithm>
 #include <array>
 #include <iterator>
+#include <memory>
 #include <set>
 #include <stdexcept>
 #include <string>
@@ -376,17 +377,22 @@ struct Generator {
   }
 
   void WriteDocuments(const fs::path& folder) {
-    std::array<std::vector<std::string>, 4> files;
+    std::array<std::unique_ptr<RecordWriter>, 4> files;
+    std::array<int64_t, 4> written = {0, 0, 0, 0};
+    for (size_t f = 0; f < files.size(); ++f) {
+      files[f] = std::make_unique<RecordWriter>(folder / kDocFiles[f]);
+    }
     std::array<int, 4> reference = {1000, 5000, 20000, 300};
     constexpr int kCodeCount = static_cast<int>(std::size(kCodes));
     for (int d = 0; d < opt.documents; ++d) {
       const CodeFile cf = d < kCodeCount   ? kCodes[d]
                           : rnd.Chance(30) ? kCodes[0]
                                            : kCodes[rnd.Between(0, kCodeCount - 1)];
-      std::vector<std::string>& out = files[cf.file];
+      RecordWriter& out = *files[cf.file];
+      int64_t& records = written[cf.file];
       DocumentTruth t;
       t.file = kDocFiles[cf.file];
-      t.headerRecord = static_cast<int64_t>(out.size()) + 1;
+      t.headerRecord = records + 1;
       t.type = cf.code;
       t.accountIndex = rnd.Chance(1) ? -1 : PickAccount();
       reference[cf.file] = reference[cf.file] >= 99999 ? 1 : reference[cf.file] + 1;
@@ -416,11 +422,12 @@ struct Generator {
                   : rnd.Chance(20) ? HostField("לידי " + PersonName(rnd), 48)
                                    : "";
       h.lineCount = static_cast<uint8_t>(lines);
-      out.push_back(DocHeaderRecord(h));
-      out.push_back(DocSecondHeaderRecord(t.date, t.dueDate));
+      out.Add(DocHeaderRecord(h));
+      out.Add(DocSecondHeaderRecord(t.date, t.dueDate));
+      records += 2;
       for (int j = 0; j < lines; ++j) {
         DocumentTruth::Line line;
-        line.record = static_cast<int64_t>(out.size()) + 1;
+        line.record = ++records;
         line.type = cf.code;
         DocLineFields lf;
         int k = rnd.Between(0, 99);
@@ -436,12 +443,12 @@ struct Generator {
         }
         lf.type = line.type;
         if (opt.keepDetail) line.itemKey = lf.itemKey;
-        out.push_back(DocLineRecord(lf));
+        out.Add(DocLineRecord(lf));
         if (opt.keepDetail) t.lines.push_back(std::move(line));
       }
       if (opt.keepDetail) truth.documents.push_back(std::move(t));
     }
-    for (size_t f = 0; f < files.size(); ++f) WriteRecords(folder / kDocFiles[f], files[f]);
+    for (auto& f : files) f->Close();
   }
 
   // The four entries of a transaction: some blank, sometimes one account twice.
