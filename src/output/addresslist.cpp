@@ -64,7 +64,7 @@ void CreateHTML(const std::string& pFileName, const std::string& pDBFile, const 
 
   db::Database database = db::Database::Open(pDBFile);
   db::Snapshot rs = database.OpenSnapshot(BuildRecipientsStatement(panel, docTypes, selectDbPath));
-  if (rs.BOF() && rs.EOF()) {
+  if (rs.BOF() || rs.EOF()) {  // either, right after opening: no rows
     // No recipients: the page stops after the column headings.
     f.Close();
     return;

@@ -137,8 +137,8 @@ void CreateCSV(const std::string& pFileName, const std::string& pDBFile, int16_t
 
   db::Database database = db::Database::Open(pDBFile);
   db::Snapshot rs = database.OpenSnapshot(BuildRecipientsStatement(panel, docTypes, selectDbPath));
-  if (rs.BOF() && rs.EOF()) {
-    f.Close();  // no recipients: an empty file, not even a header
+  if (rs.BOF() || rs.EOF()) {  // either, right after opening: no rows
+    f.Close();                 // no recipients: an empty file, not even a header
     return;
   }
   rs.MoveLast();

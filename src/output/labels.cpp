@@ -210,7 +210,7 @@ void CreateLabFile(const std::string& pFileName, const std::string& pDBFile, con
 
   db::Database database = db::Database::Open(pDBFile);
   db::Snapshot rs = database.OpenSnapshot(BuildRecipientsStatement(panel, docTypes, selectDbPath));
-  if (rs.BOF() && rs.EOF()) {
+  if (rs.BOF() || rs.EOF()) {  // either, right after opening: no rows
     // No recipients: the page stops after the BODY line.
     f.Close();
     return;

@@ -1,0 +1,198 @@
+// Test support for the outputs: a fresh temporary folder as `Temp`, a working database
+// filled with given accounts (and document headers) straight through the engine, a seam that
+// records what the outputs report, and file helpers.
+#pragma once
+
+#include <gtest/gtest.h>
+#include <stdlib.h>
+
+#include <filesystem>
+#include <fstream>
+#include <iterator>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "control/panel.h"
+#include "control/userseam.h"
+#include "import/codepage.h"
+#include "import/doctypes.h"
+#include "output/output.h"
+#include "output/outputdefs.h"
+#include "workdb/schema.h"
+
+#ifdef EOF
+#undef EOF
+#endif
+#include "workdb/engine.h"
+
+namespace zdr::testing {
+
+using Text = std::optional<std::string>;
+
+struct AccountRow {
+  std::string key;
+  Text name, address, city, zip, district, details, telephone;
+};
+
+// A document header of the chosen type, joined to its account by `key`.
+struct HeadRow {
+  std::string key;
+  int64_t reference = 0;
+  Text customerName, address1, address2, detailsLine1;
+};
+
+class RecordingSeam : public UserSeam {
+ public:
+  void ShowMessage(std::string_view text, std::string_view title, MsgIcon) override {
+    messages.push_back(std::string(title) + ": " + std::string(text));
+  }
+  bool AskYesNo(std::string_view, std::string_view, MsgIcon) override { return true; }
+  void SetStatus(std::string_view text) override { status = text; }
+  void SetProgress(int fillWidth) override { progress.push_back(fillWidth); }
+  bool OpenInBrowser(const std::string& path) override {
+    opened.push_back(path);
+    return true;
+  }
+  bool OpenInSpreadsheet(const std::string& path) override {
+    opened.push_back(path);
+    return spreadsheetWorks;
+  }
+
+  std::vector<std::string> messages;
+  std::string status;
+  std::vector<int> progress;
+  std::vector<std::string> opened;
+  bool spreadsheetWorks = true;
+};
+
+inline std::string ReadBytes(const std::filesystem::path& p) {
+  std::ifstream in(p, std::ios::binary);
+  return std::string((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
+}
+
+// Joins lines with CR LF after each.
+inline std::string Lines(const std::vector<std::string>& lines) {
+  std::string out;
+  for (const auto& l : lines) out += l + "\r\n";
+  return out;
+}
+
+inline size_t Count(std::string_view text, std::string_view what) {
+  size_t n = 0;
+  for (size_t at = text.find(what); at != std::string_view::npos;
+       at = text.find(what, at + what.size())) {
+    ++n;
+  }
+  return n;
+}
+
+inline std::vector<AccountRow> NumberedAccounts(int n) {
+  std::vector<AccountRow> rows;
+  for (int i = 1; i <= n; ++i) {
+    const std::string k = std::to_string(i);
+    rows.push_back(
+        {k, "לקוח " + k, "רחוב " + k, "חיפה", "3100" + k, "כרמל", "משה " + k, "04-555" + k});
+  }
+  return rows;
+}
+
+class OutputTest : public ::testing::Test {
+ protected:
+  void SetUp() override {
+    std::string pattern = (std::filesystem::temp_directory_path() / "zdrout.XXXXXX").string();
+    ASSERT_NE(mkdtemp(pattern.data()), nullptr);
+    dir_ = pattern;
+    setenv("Temp", dir_.c_str(), 1);
+    panel.CmbSortBy = 0;  // by sort key: the order rows were added in
+    panel.CmbSortDir = 0;
+  }
+  void TearDown() override {
+    std::error_code ec;
+    std::filesystem::remove_all(dir_, ec);
+  }
+
+  // A new working database holding `accounts` (sorted in the given order) and `heads`.
+  std::string BuildDb(const std::vector<AccountRow>& accounts,
+                      const std::vector<HeadRow>& heads = {}) {
+    RecordingSeam createSeam;
+    const std::string path = CreateWorkDB("", createSeam);
+    EXPECT_FALSE(path.empty()) << (createSeam.messages.empty() ? "" : createSeam.messages[0]);
+    db::Database database = db::Database::Open(path);
+    {
+      db::TableRecordset t = database.OpenTable("tAccount");
+      const int key = t.FieldIndex("AccountKey"), sortKey = t.FieldIndex("SortByKey"),
+                sortVal = t.FieldIndex("SortByKeyVal"), sortName = t.FieldIndex("SortByName");
+      const int name = t.FieldIndex("AccountName"), address = t.FieldIndex("Address"),
+                city = t.FieldIndex("City"), zip = t.FieldIndex("Zip"),
+                district = t.FieldIndex("District"), details = t.FieldIndex("Details"),
+                telephone = t.FieldIndex("Telephone");
+      char order[16];
+      int n = 0;
+      for (const AccountRow& a : accounts) {
+        t.AddNew();
+        std::snprintf(order, sizeof order, "%08d", ++n);
+        t.SetText(key, a.key);
+        t.SetText(sortKey, order);
+        t.SetText(sortName, order);
+        t.SetDouble(sortVal, n);
+        const std::pair<int, const Text*> texts[] = {
+            {name, &a.name},         {address, &a.address}, {city, &a.city},          {zip, &a.zip},
+            {district, &a.district}, {details, &a.details}, {telephone, &a.telephone}};
+        for (const auto& [field, value] : texts) {
+          // Like the importers, an empty text is left Null.
+          if (value->has_value() && !(*value)->empty()) t.SetText(field, **value);
+        }
+        t.Update();
+      }
+      t.Close();
+    }
+    if (!heads.empty()) {
+      db::TableRecordset t = database.OpenTable("tStockHead");
+      char order[16];
+      int n = 0;
+      for (const HeadRow& h : heads) {
+        t.AddNew();
+        std::snprintf(order, sizeof order, "%08d", ++n);
+        t.Set("CompID", int64_t{1});
+        t.Set("TavFileID", int64_t{3});
+        t.Set("HeadIndx", int64_t{n});
+        t.Set("DocType2", int64_t{1});
+        t.Set("Reference1", h.reference);
+        t.Set("AccountKey", h.key);
+        t.Set("SortByName", std::string(order));
+        t.SetBool(t.FieldIndex("Include"), true);
+        if (h.customerName) t.Set("CustomerName", *h.customerName);
+        if (h.address1) t.Set("Address1", *h.address1);
+        if (h.address2) t.Set("Address2", *h.address2);
+        if (h.detailsLine1) t.Set("DetailsLine1", *h.detailsLine1);
+        t.Update();
+      }
+      t.Close();
+    }
+    database.Close();
+    return path;
+  }
+
+  // The panel of the document variant: invoices issued, address from the document header,
+  // ordered by the document's name key.
+  void UseDocuments() {
+    panel.ChkDates = 1;
+    panel.cmbByDoc = 0;
+    panel.cmbDocType = 0;
+    panel.cmbAddressFrom = 0;
+    panel.CmbSortBy = 1;
+  }
+
+  std::string PathOf(const std::string& name) const { return (dir_ / name).string(); }
+  std::string Utf8File(const std::string& path) const { return Win1255ToUtf8(ReadBytes(path)); }
+
+  std::filesystem::path dir_;
+  Panel panel;
+  DocTypeTable docTypes;
+  LabelSettings labels;
+  PostILSettings post;
+  RecordingSeam seam;
+};
+
+}  // namespace zdr::testing
