@@ -115,39 +115,51 @@ void HostRecordFile::OpenPath(const std::filesystem::path& path) {
   size_ = static_cast<uint64_t>(st.st_size);
 }
 
-bool HostRecordFile::Fill(int64_t n) const {
+int64_t HostRecordFile::ReadAheadRecords() const {
+  return static_cast<int64_t>(std::max<size_t>(1, kWindowBytes / recLen_));
+}
+
+bool HostRecordFile::Fill(Window& w, int64_t n) const {
   const int64_t whole = WholeRecords();
-  const int64_t perWindow = static_cast<int64_t>(std::max<size_t>(1, kWindowBytes / recLen_));
+  const int64_t perWindow = ReadAheadRecords();
   const int64_t want = std::min(perWindow, whole - n + 1);
   const size_t bytes = static_cast<size_t>(want) * recLen_;
-  if (window_.size() < bytes) {
-    // Sized once for the file: the whole window, or the whole file when it is smaller.
-    window_.resize(static_cast<size_t>(std::min(perWindow, whole)) * recLen_);
+  if (w.bytes.size() < bytes) {
+    // Sized once for the file: a whole block, or the whole file when it is smaller.
+    w.bytes.resize(static_cast<size_t>(std::min(perWindow, whole)) * recLen_);
   }
   const off_t start = static_cast<off_t>(n - 1) * static_cast<off_t>(recLen_);
   size_t got = 0;
+  w.count = 0;
   while (got < bytes) {
-    ssize_t r = ::pread(fd_, window_.data() + got, bytes - got, start + static_cast<off_t>(got));
+    ssize_t r = ::pread(fd_, w.bytes.data() + got, bytes - got, start + static_cast<off_t>(got));
     if (r < 0) {
       if (errno == EINTR) continue;
       int err = errno;
-      winCount_ = 0;
       throw HostFileError("שגיאה בקריאת הקובץ " + path_.string() + ": " + ErrnoText(err));
     }
     if (r == 0) break;  // the host cut the file since it was opened
     got += static_cast<size_t>(r);
   }
-  winFirst_ = n;
-  winCount_ = static_cast<int64_t>(got / recLen_);
-  return winCount_ > 0;
+  w.first = n;
+  w.count = static_cast<int64_t>(got / recLen_);
+  return w.count > 0;
 }
 
 std::string_view HostRecordFile::Record(int64_t n) const {
   if (n < 1 || n > WholeRecords()) return {};
-  if (n < winFirst_ || n >= winFirst_ + winCount_) {
-    if (!Fill(n)) return {};
+  const Window* w = nullptr;
+  if (windows_[newest_].Holds(n)) {
+    w = &windows_[newest_];
+  } else if (windows_[1 - newest_].Holds(n)) {
+    w = &windows_[1 - newest_];
+  } else {
+    // Refill the block filled earlier: the newest one holds what a scan may still hold.
+    newest_ = 1 - newest_;
+    if (!Fill(windows_[newest_], n)) return {};
+    w = &windows_[newest_];
   }
-  return std::string_view(window_.data() + static_cast<size_t>(n - winFirst_) * recLen_, recLen_);
+  return std::string_view(w->bytes.data() + static_cast<size_t>(n - w->first) * recLen_, recLen_);
 }
 
 int64_t RoundHalfEven(double x) {

@@ -52,23 +52,38 @@ class HostRecordFile {
 
   // The bytes of record n (1-based). Returns an empty view when record n is not wholly in
   // the file (n < 1, beyond the end, the partial last record, or a record the host cut off
-  // since the file was opened), so a partial record is never read as if whole. The view is
-  // valid until the next call of Record on this object. Throws HostFileError on a read
-  // error. Not safe for concurrent use of one object.
+  // since the file was opened), so a partial record is never read as if whole. Throws
+  // HostFileError on a read error. Not safe for concurrent use of one object.
+  //
+  // The view is valid until the next call of Record, with one relaxation that scans rely
+  // on: in a scan that reads records in increasing order, the view of record n stays valid
+  // until a record beyond n + ReadAheadRecords() is read, so a document header may be held
+  // while its lines are read.
   std::string_view Record(int64_t n) const;
 
+  // Records per read block (at least 1; 6168 for 170-byte records).
+  int64_t ReadAheadRecords() const;
+
  private:
+  // A block of whole records: records first .. first + count - 1 are in bytes.
+  struct Window {
+    std::string bytes;
+    int64_t first = 0;
+    int64_t count = 0;
+    bool Holds(int64_t n) const { return n >= first && n < first + count; }
+  };
+
   void OpenPath(const std::filesystem::path& path);
-  bool Fill(int64_t n) const;
+  // Reads the block that starts at record n into `w`; false when nothing whole was read.
+  bool Fill(Window& w, int64_t n) const;
 
   std::filesystem::path path_;
   size_t recLen_;
   uint64_t size_ = 0;
   int fd_ = -1;
-  // The window: records winFirst_ .. winFirst_ + winCount_ - 1 are in window_.
-  mutable std::string window_;
-  mutable int64_t winFirst_ = 0;
-  mutable int64_t winCount_ = 0;
+  // Two blocks, refilled in turn, so the block read last before a refill survives it.
+  mutable Window windows_[2];
+  mutable int newest_ = 0;
 };
 
 // Round to nearest, halves to even (the host's conversion of a count to a record number),

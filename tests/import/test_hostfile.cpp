@@ -5,8 +5,8 @@
 
 #include <cmath>
 #include <filesystem>
-#include <limits>
 #include <fstream>
+#include <limits>
 #include <string>
 
 namespace zdr {
@@ -123,6 +123,33 @@ TEST_F(HostFileTest, RecordsCrossingTheBlockWindowReadCorrectly) {
   for (int n : {count, 1, 1613, 1614, 1612, 3227, 2, count - 1}) {
     ASSERT_EQ(f.Record(n), std::string_view(bytes).substr(static_cast<size_t>(n - 1) * 650, 650))
         << n;
+  }
+}
+
+// A document header is held while its lines are read; a block refill between them must not
+// overwrite the header's bytes.
+TEST_F(HostFileTest, HeldHeaderSurvivesWindowRefill) {
+  Write("IMV.FIX", "");
+  const int64_t perBlock = HostRecordFile(dir_, "IMV.FIX", 170).ReadAheadRecords();
+  ASSERT_EQ(perBlock, (1 << 20) / 170);
+  const int count = static_cast<int>(3 * perBlock + 100);
+  const std::string bytes = Records(count, 170);
+  Write("IMV.FIX", bytes);
+  HostRecordFile f(dir_, "IMV.FIX", 170);
+  auto expected = [&](int64_t n) {
+    return std::string_view(bytes).substr(static_cast<size_t>(n - 1) * 170, 170);
+  };
+  // A header every 257 records (a header, its second record and up to 255 lines), held
+  // while the scan reads on across every block boundary.
+  int64_t held = 1;
+  std::string_view head = f.Record(1);
+  for (int64_t n = 2; n <= count; ++n) {
+    ASSERT_EQ(f.Record(n), expected(n)) << n;
+    ASSERT_EQ(head, expected(held)) << "header " << held << " after reading " << n;
+    if ((n - 1) % 257 == 0) {
+      held = n;
+      head = f.Record(n);
+    }
   }
 }
 
