@@ -351,6 +351,12 @@ void RewriteCommon(Range& t) {
       } else if (EqualsNoCase(tok.text, "TOP") && !out.empty() &&
                  (IsWord(out.back(), "SELECT") || IsWord(out.back(), "DISTINCT"))) {
         FailAt("TOP אינו נתמך", tok.pos);
+      } else if (EqualsNoCase(tok.text, "Mod") && !out.empty() &&
+                 (out.back().kind != Tok::Op && out.back().kind != Tok::LParen &&
+                  out.back().kind != Tok::Comma && !IsExpressionKeyword(out.back()))) {
+        // Jet's remainder operator, after an operand.
+        tok.kind = Tok::Op;
+        tok.text = "%";
       }
     }
     out.push_back(std::move(tok));

@@ -17,22 +17,17 @@ struct CreateFailure {
   std::string description;
 };
 
-// Removes a leftover database file and the journal files SQLite may have left beside it;
-// a stale journal next to a new file would be rolled into it.
+// Removes a leftover database file. A folder of that name is not removed: it is reported.
 void RemoveOldFile(const std::filesystem::path& path) {
   namespace fs = std::filesystem;
   std::error_code ec;
   const fs::file_status st = fs::symlink_status(path, ec);
+  if (!fs::exists(st)) return;
   if (fs::is_directory(st)) {
     throw CreateFailure{"לא ניתן ליצור את מסד הנתונים: קיימת תיקייה בשם " + path.string()};
   }
-  for (const char* suffix : {"", "-journal", "-wal", "-shm"}) {
-    fs::path p = path;
-    p += suffix;
-    if (!fs::exists(fs::symlink_status(p, ec))) continue;
-    if (!fs::remove(p, ec) && ec) {
-      throw CreateFailure{"לא ניתן למחוק את הקובץ " + p.string() + ": " + ec.message()};
-    }
+  if (!fs::remove(path, ec) && ec) {
+    throw CreateFailure{"לא ניתן למחוק את הקובץ " + path.string() + ": " + ec.message()};
   }
 }
 

@@ -363,6 +363,13 @@ TEST(TranslateLiterals, DateLiteralsBecomeSerials) {
   EXPECT_EQ(SyntaxErrorOf("SELECT #12/31/1999"), kErrSyntax);
 }
 
+TEST(TranslateLiterals, ModIsTheRemainderOnlyBetweenOperands) {
+  EXPECT_EQ(TranslateJetSql("SELECT HeadIndx Mod 2 FROM t"), "SELECT HeadIndx % 2 FROM t");
+  EXPECT_EQ(TranslateJetSql("SELECT Mod FROM t"), "SELECT Mod FROM t");
+  BareDb db;
+  EXPECT_EQ(db.Rows("SELECT 7 MOD 3, (8) mod 5"), (std::vector<std::string>{"1|3"}));
+}
+
 TEST(TranslateLiterals, TrailingSemicolonOnlyAtTheEnd) {
   EXPECT_EQ(TranslateJetSql("SELECT a FROM t;  "), "SELECT a FROM t");
   EXPECT_EQ(SyntaxErrorOf("SELECT a FROM t; DROP TABLE t"), kErrSyntax);
