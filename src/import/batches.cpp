@@ -1,1 +1,118 @@
-// Placeholder: filled as the part lands.
+// Temporary batches: the company's a<number>.tmp files into tTransact.
+
+#include <cctype>
+#include <exception>
+#include <filesystem>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <system_error>
+
+#include "import/hostfile.h"
+#include "import/hosttext.h"
+#include "import/importcommon.h"
+#include "import/importers.h"
+#include "workdb/engine.h"
+
+namespace zdr {
+
+namespace {
+
+using importing::FieldOf;
+
+constexpr size_t kBatchRecord = 220;
+constexpr size_t kTypeAt = 1, kTypeLen = 3;
+constexpr size_t kKeysAt = 57, kKeyLen = 8;
+constexpr size_t kDateAt = 89, kValueDateAt = 92;
+
+bool EqualsNoCase(std::string_view a, std::string_view b) {
+  if (a.size() != b.size()) return false;
+  for (size_t i = 0; i < a.size(); ++i) {
+    if (std::tolower(static_cast<unsigned char>(a[i])) !=
+        std::tolower(static_cast<unsigned char>(b[i]))) {
+      return false;
+    }
+  }
+  return true;
+}
+
+// The batch number of a file name of the form a<number>.tmp (any case), or nothing when the
+// name has another form, its middle is not a number, or the number does not fit 16 bits.
+std::optional<int16_t> BatchNumberOf(std::string_view name) {
+  if (name.size() < 5 || !EqualsNoCase(name.substr(0, 1), "a") ||
+      !EqualsNoCase(name.substr(name.size() - 4), ".tmp")) {
+    return std::nullopt;
+  }
+  std::string_view middle = name.substr(1, name.size() - 5);
+  if (!importing::IsNumericText(middle)) return std::nullopt;
+  try {
+    const int64_t v = HostIntValue(middle);
+    if (v < INT16_MIN || v > INT16_MAX) return std::nullopt;
+    return static_cast<int16_t>(v);
+  } catch (const std::exception&) {
+    return std::nullopt;
+  }
+}
+
+}  // namespace
+
+void ReadAllTempTrans(const std::string& CompPath, const std::string& pDBFile, const Panel& panel,
+                      UserSeam& ui) {
+  const importing::JournalRange journals = importing::JournalRange::FromPanel(panel);
+
+  // Listed in the order the folder gives them. A folder that cannot be listed has no batches.
+  std::error_code ec;
+  std::filesystem::directory_iterator it(CompPath, ec);
+  if (ec) return;
+  for (const std::filesystem::directory_entry& entry : it) {
+    std::error_code typeEc;
+    if (!entry.is_regular_file(typeEc)) continue;
+    const std::string name = entry.path().filename().string();
+    const std::optional<int16_t> batch = BatchNumberOf(name);
+    if (!batch || *batch == 0 || !journals.Contains(*batch)) continue;
+    // The file the listing found is read: a012.tmp is batch 12 but is not the file a12.tmp.
+    ReadTempTransactions(CompPath, pDBFile, *batch, name, panel, ui);
+  }
+}
+
+int16_t ReadTempTransactions(const std::string& CompPath, const std::string& pDBFile,
+                             int16_t pJournalNo, const Panel& panel, UserSeam& ui) {
+  return ReadTempTransactions(CompPath, pDBFile, pJournalNo,
+                              "a" + std::to_string(pJournalNo) + ".tmp", panel, ui);
+}
+
+int16_t ReadTempTransactions(const std::string& CompPath, const std::string& pDBFile,
+                             int16_t pJournalNo, const std::string& pFileName, const Panel& panel,
+                             UserSeam& ui) {
+  try {
+    importing::LedgerFilter filter(panel);
+
+    HostRecordFile file(CompPath, pFileName, kBatchRecord);
+    const int64_t n = RoundHalfEven(file.Count());
+
+    ProgressReporter progress(ui, static_cast<double>(n));
+    db::Database db = db::Database::Open(pDBFile);
+    db::TableRecordset rs = db.OpenTable("tTransact");
+    importing::TransactWriter writer(rs);
+
+    for (int64_t i = 1; i <= n; ++i) {
+      std::string_view rec = importing::RecordOf(file, i);
+      if (filter.Pass(FieldOf(rec, kTypeAt, kTypeLen), importing::DateAt(rec, kDateAt),
+                      importing::DateAt(rec, kValueDateAt))) {
+        for (size_t k = 0; k < 4; ++k) {
+          writer.Add(pJournalNo, static_cast<int32_t>(i),
+                     FieldOf(rec, kKeysAt + k * kKeyLen, kKeyLen));
+        }
+      }
+      if (i % 5 == 0) progress.Update(static_cast<double>(i));
+    }
+    rs.Close();
+    db.Close();
+    return -1;
+  } catch (const std::exception& e) {
+    ui.ShowMessage(e.what(), kTitleFault, MsgIcon::Information);
+    return 0;
+  }
+}
+
+}  // namespace zdr

@@ -1,1 +1,210 @@
-// Placeholder: filled as the part lands.
+#include "import/importcommon.h"
+
+#include <cmath>
+#include <cstdlib>
+#include <limits>
+
+#include "import/codepage.h"
+#include "import/hosttext.h"
+#include "workdb/jetsql.h"
+
+namespace zdr::importing {
+
+namespace {
+
+bool IsDigit(char c) {
+  return c >= '0' && c <= '9';
+}
+
+// Length of the number at the start of `s` (no leading spaces): sign, digits, point, digits,
+// exponent. 0 when there is no digit.
+size_t NumberLength(std::string_view s) {
+  size_t i = 0;
+  if (i < s.size() && (s[i] == '+' || s[i] == '-')) ++i;
+  size_t digits = 0;
+  while (i < s.size() && IsDigit(s[i])) ++i, ++digits;
+  if (i < s.size() && s[i] == '.') {
+    ++i;
+    while (i < s.size() && IsDigit(s[i])) ++i, ++digits;
+  }
+  if (digits == 0) return 0;
+  if (i < s.size() && (s[i] == 'e' || s[i] == 'E')) {
+    size_t j = i + 1;
+    if (j < s.size() && (s[j] == '+' || s[j] == '-')) ++j;
+    size_t expDigits = 0;
+    while (j < s.size() && IsDigit(s[j])) ++j, ++expDigits;
+    if (expDigits > 0) i = j;
+  }
+  return i;
+}
+
+std::string_view SkipLeadingSpaces(std::string_view s) {
+  size_t i = 0;
+  while (i < s.size() && s[i] == ' ') ++i;
+  return s.substr(i);
+}
+
+double ParseNumber(std::string_view s, size_t len) {
+  std::string copy(s.substr(0, len));  // strtod needs a terminated string; numbers are short
+  return std::strtod(copy.c_str(), nullptr);
+}
+
+std::string Quoted(std::string_view s) {
+  std::string out = "\"";
+  out += s;
+  out += '"';
+  return out;
+}
+
+}  // namespace
+
+std::string PanelText(std::string_view utf8) {
+  try {
+    return Utf8ToWin1255(utf8);
+  } catch (const CodePageError&) {
+    throw ImportError("הטקסט " + Quoted(utf8) + " מכיל תו שאינו קיים בקוד העברי של המערכת");
+  }
+}
+
+bool IsNumericText(std::string_view s) {
+  s = TrimSpaces(s);
+  if (s.empty()) return false;
+  return NumberLength(s) == s.size();
+}
+
+double NumberAtStart(std::string_view s) {
+  s = SkipLeadingSpaces(s);
+  size_t len = NumberLength(s);
+  return len == 0 ? 0.0 : ParseNumber(s, len);
+}
+
+int32_t LongAtStart(std::string_view s, std::string_view what) {
+  double v = NumberAtStart(s);
+  // Round half to even, as the host's conversion to a whole number does.
+  double r = std::nearbyint(v);
+  if (!(r >= std::numeric_limits<int32_t>::min() && r <= std::numeric_limits<int32_t>::max())) {
+    throw ImportError(std::string(what) + ": המספר " + Quoted(s) + " גדול מדי");
+  }
+  return static_cast<int32_t>(r);
+}
+
+int64_t PanelWholeNumber(std::string_view utf8, int64_t lo, int64_t hi, std::string_view what) {
+  int64_t v = 0;
+  try {
+    v = HostIntValue(utf8);
+  } catch (const std::exception&) {
+    throw ImportError(std::string(what) + ": " + Quoted(utf8) + " אינו מספר שלם בין " +
+                      std::to_string(lo) + " ל-" + std::to_string(hi));
+  }
+  if (v < lo || v > hi) {
+    throw ImportError(std::string(what) + ": " + Quoted(utf8) + " אינו מספר שלם בין " +
+                      std::to_string(lo) + " ל-" + std::to_string(hi));
+  }
+  return v;
+}
+
+int CompareCodes(std::string_view a, std::string_view b) {
+  size_t n = a.size() < b.size() ? a.size() : b.size();
+  for (size_t i = 0; i < n; ++i) {
+    if (a[i] == b[i]) continue;
+    char32_t ca = Win1255ToCodePoint(static_cast<unsigned char>(a[i]));
+    char32_t cb = Win1255ToCodePoint(static_cast<unsigned char>(b[i]));
+    if (ca != cb) return ca < cb ? -1 : 1;
+  }
+  if (a.size() == b.size()) return 0;
+  return a.size() < b.size() ? -1 : 1;
+}
+
+std::string_view RecordOf(const HostRecordFile& file, int64_t n) {
+  std::string_view rec = file.Record(n);
+  if (rec.size() != file.RecordLength()) {
+    throw ImportError("הקובץ " + file.Path().filename().string() + " פגום: רשומה " +
+                      std::to_string(n) + " אינה שלמה");
+  }
+  return rec;
+}
+
+Date DateAt(std::string_view rec, size_t offset) {
+  return HostDateFromBytes(ByteOf(rec, offset), ByteOf(rec, offset + 1), ByteOf(rec, offset + 2));
+}
+
+void UpdatePassingDuplicates(db::TableRecordset& rs) {
+  try {
+    rs.Update();
+  } catch (const db::EngineError& e) {
+    if (!IsDuplicateKey(e)) throw;
+  }
+}
+
+void TextColumn::Set(db::TableRecordset& rs, std::string_view win1255) {
+  buf_.clear();
+  AppendWin1255AsUtf8(win1255, buf_);
+  rs.SetText(index_, buf_);
+}
+
+LedgerFilter::LedgerFilter(const Panel& panel) {
+  if (Panel::On(panel.chkTransType) && !panel.txtTransType.empty()) {
+    hasPattern_ = true;
+    pattern_ = panel.txtTransType;
+  }
+  auto date = [](int box, const std::string& text) -> std::optional<Date> {
+    if (!Panel::On(box) || text.empty()) return std::nullopt;
+    return ParseHostDate(PanelText(text));
+  };
+  from_ = date(panel.chkTransDates, panel.txtFromTransDate);
+  to_ = date(panel.chkTransDates, panel.txtToTransDate);
+  valueFrom_ = date(panel.chkTransVDate, panel.txtFromTransVDate);
+  valueTo_ = date(panel.chkTransVDate, panel.txtToTransVDate);
+}
+
+bool LedgerFilter::Pass(std::string_view typeField, Date date, Date valueDate) {
+  if (hasPattern_) {
+    std::string spaced = ConvertSpaced(TrimSpaces(typeField));
+    typeUtf8_.clear();
+    AppendWin1255AsUtf8(spaced, typeUtf8_);
+    // The spaced conversion ends a type of Latin letters or digits with a space; a pattern
+    // typed as the type reads on screen ("AB", "#") must still match it.
+    if (!db::JetLike(pattern_, typeUtf8_, true) &&
+        !db::JetLike(pattern_, TrimSpaces(typeUtf8_), true)) {
+      return false;
+    }
+  }
+  if (from_ && date < *from_) return false;
+  if (to_ && date > *to_) return false;
+  if (valueFrom_ && valueDate < *valueFrom_) return false;
+  if (valueTo_ && valueDate > *valueTo_) return false;
+  return true;
+}
+
+JournalRange JournalRange::FromPanel(const Panel& panel) {
+  JournalRange r;
+  if (!Panel::On(panel.ChkJournal)) return r;
+  if (!panel.txtFromJournal.empty()) {
+    r.from =
+        static_cast<int16_t>(PanelWholeNumber(panel.txtFromJournal, INT16_MIN, INT16_MAX, "ממנה"));
+  }
+  if (!panel.txtToJournal.empty()) {
+    r.to =
+        static_cast<int16_t>(PanelWholeNumber(panel.txtToJournal, INT16_MIN, INT16_MAX, "עד מנה"));
+  }
+  return r;
+}
+
+TransactWriter::TransactWriter(db::TableRecordset& rs)
+    : rs_(rs),
+      fileId_(rs.FieldIndex("FileID")),
+      transId_(rs.FieldIndex("TransID")),
+      key_(rs, "AccountKey") {}
+
+void TransactWriter::Add(int32_t fileId, int32_t transId, std::string_view keyField) {
+  std::string key = ReverseAndMirror(keyField);
+  std::string_view trimmed = TrimSpaces(key);
+  if (trimmed.empty()) return;
+  rs_.AddNew();
+  rs_.SetInt(fileId_, fileId);
+  rs_.SetInt(transId_, transId);
+  key_.Set(rs_, trimmed);
+  UpdatePassingDuplicates(rs_);
+}
+
+}  // namespace zdr::importing

@@ -1,0 +1,33 @@
+// The data load every output command runs first: a fresh working database, the accounts, and
+// the other host data the panel's criteria need.
+#pragma once
+
+#include "control/control.h"
+#include "control/panel.h"
+#include "control/userseam.h"
+#include "import/doctypes.h"
+
+namespace zdr {
+
+// Status messages of the load, in the order they can appear.
+inline constexpr std::string_view kStatusInitDb = "מאתחל בסיס נתונים";
+inline constexpr std::string_view kStatusAccounts = "קורא רשימת כרטיסים";
+inline constexpr std::string_view kStatusCash = "קורא תנועות קופה...";
+inline constexpr std::string_view kStatusDocuments = "קורא מסמכים...";
+inline constexpr std::string_view kStatusItems = "קורא פריטים...";
+inline constexpr std::string_view kStatusLedger = "קורא תנועות הנהלת חשבונות...";
+inline constexpr std::string_view kStatusBatches = "קורא מנות ממאגר זמני...";
+inline constexpr std::string_view kStatusLoaded = "קריאת הנתונים הסתיימה";
+
+// Recreates the working database (its path, empty when creation failed, goes to
+// state.workDbPath) and imports into it: the accounts always; with ChkDates on, the cash
+// receipts (document type 26) or the documents of the chosen type and, with ChkByItems on,
+// the items; with a ledger criterion on, the ledger and, with chkReadTempTrans on, the
+// temporary batches. pAsIs goes to the account and document imports. The importers report
+// their own failures and the load goes on; an error of the ledger-criteria test or of the
+// batch listing (a journal bound that is not a number) ends the load and is thrown to the
+// caller. The panel may change: ReadACT writes a space into an empty CutOff box.
+void ReadAllData(bool pAsIs, Panel& panel, ControlState& state, const DocTypeTable& docTypes,
+                 UserSeam& ui);
+
+}  // namespace zdr

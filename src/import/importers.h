@@ -1,0 +1,84 @@
+// The importers: each reads one kind of host record file of a company and appends the rows
+// that pass the panel's criteria to its table of a database file created beforehand.
+//
+// Contract shared by all of them:
+// - `CompPath` is the company folder (no trailing separator); host file names are looked up
+//   in it without regard to case. Host files are only read.
+// - `pDBFile` is the path of an existing database holding the target table (the working
+//   database, or the account-selection database for ReadACT with pAllDetails false). Rows are
+//   appended through one prepared statement inside one transaction; rows appended before a
+//   failure stay.
+// - A failure is shown through `ui` (its text, title and icon are each importer's own) and the
+//   importer returns normally; only ReadAllTempTrans lets errors of its own steps escape.
+// - A second row with a key already in the table is passed over silently.
+// - Progress goes to `ui.SetProgress`, 0 at the start and at the end.
+#pragma once
+
+#include <cstdint>
+#include <string>
+
+#include "control/panel.h"
+#include "control/userseam.h"
+#include "import/doctypes.h"
+
+namespace zdr {
+
+// Titles of the importers' messages.
+inline constexpr std::string_view kTitleAccountsFault = "תקלה בקריאת החשבונות";
+// Shown by ReadStock when the document file of the chosen type is missing.
+inline constexpr std::string_view kMsgNoDocumentFiles = "קבצי מסמכים לא נמצאו";
+
+// Accounts from ACT.fix into tAccount (pAllDetails: every column) or tSelectAccount (key, sort
+// key, sort name, Include), applying the agent, account-key, sort-code and cut-off criteria.
+// pAsIs chooses the display conversion of the key. With the cut-off criterion on, an empty
+// CutOff box of `panel` is set to one space. Returns true when the file was read to its end,
+// false after showing a failure (title kTitleAccountsFault, critical icon).
+bool ReadACT(const std::string& CompPath, const std::string& pDBFile, bool pAllDetails, bool pAsIs,
+             Panel& panel, UserSeam& ui);
+
+// Items of the panel's item ranges from ITM.fix into tItem, then marks tStockHead.Include True
+// for exactly the headers with a line of such an item. Failures: information icon, "תקלה".
+void ReadItem(const std::string& CompPath, const std::string& pDBFile, const Panel& panel,
+              UserSeam& ui);
+
+// Documents of row `pDocTypeIndex` of `docTypes` dated pFromDate..pToDate (texts as typed; one
+// shorter than 6 characters is no bound) and numbered txtFromRef..txtToRef into tStockHead, and
+// their lines into tStockLine when pWithLines. A header is written only when its document has
+// an accepted line. Returns 0 when the file is missing (kMsgNoDocumentFiles, critical, "שגיאה")
+// or a failure stopped the scan (its text, critical, "שגיאה"); else the scan's record counter
+// at its end, which is greater than the file's record count.
+int32_t ReadStock(int16_t pCompID, const std::string& pCompPath, const std::string& pFromDate,
+                  const std::string& pToDate, const std::string& pDBFile, uint8_t pDocTypeIndex,
+                  bool pWithLines, bool pAsIs, const Panel& panel, const DocTypeTable& docTypes,
+                  UserSeam& ui);
+
+// Ledger transactions of amv.fix that pass the journal range, the type pattern and both date
+// ranges into tTransact with FileID -1, one row per account entry. Returns -1 when the file was
+// read to its end, 0 after showing a failure (information icon, "תקלה").
+int16_t ReadTransactions(const std::string& CompPath, const std::string& pDBFile,
+                         const Panel& panel, UserSeam& ui);
+
+// Lists the company's temporary batches (a<number>.tmp, any case) and reads each whose number
+// is not 0 and lies in the panel's journal range with ReadTempTransactions. Names whose middle
+// is not a number, or a number outside the 16-bit range, are passed over. Throws what it does
+// not handle itself: a journal bound that is not a 16-bit whole number.
+void ReadAllTempTrans(const std::string& CompPath, const std::string& pDBFile, const Panel& panel,
+                      UserSeam& ui);
+
+// Transactions of batch `pJournalNo` (the file a<pJournalNo>.tmp) that pass the type pattern
+// and both date ranges into tTransact with FileID pJournalNo. Returns -1 / 0 as
+// ReadTransactions, with the same failure message.
+int16_t ReadTempTransactions(const std::string& CompPath, const std::string& pDBFile,
+                             int16_t pJournalNo, const Panel& panel, UserSeam& ui);
+// The same for the batch file `pFileName` (a name in CompPath, as the listing found it, looked
+// up without regard to case), whose rows carry `pJournalNo`.
+int16_t ReadTempTransactions(const std::string& CompPath, const std::string& pDBFile,
+                             int16_t pJournalNo, const std::string& pFileName, const Panel& panel,
+                             UserSeam& ui);
+
+// Cash receipts of icash2.fix dated within the panel's document dates (when ChkDates is on;
+// any non-empty date text is a bound) into tCash. Returns -1 / 0 as ReadTransactions.
+int16_t ReadCash(const std::string& CompPath, const std::string& pDBFile, const Panel& panel,
+                 UserSeam& ui);
+
+}  // namespace zdr
