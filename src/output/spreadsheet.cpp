@@ -32,19 +32,19 @@ std::string Lower(std::string s) {
   return s;
 }
 
-std::vector<std::string> SplitCsvLine(std::string_view line) {
-  std::vector<std::string> cells;
+// Splits at every comma (the file quotes nothing) into `cells`, reusing its strings.
+void SplitCsvLine(std::string_view line, std::vector<std::string>& cells) {
+  size_t n = 0;
   size_t from = 0;
   while (true) {
     const size_t comma = line.find(',', from);
-    if (comma == std::string_view::npos) {
-      cells.emplace_back(line.substr(from));
-      break;
-    }
-    cells.emplace_back(line.substr(from, comma - from));
+    const size_t end = comma == std::string_view::npos ? line.size() : comma;
+    if (n == cells.size()) cells.emplace_back();
+    cells[n++].assign(line.substr(from, end - from));
+    if (comma == std::string_view::npos) break;
     from = comma + 1;
   }
-  return cells;
+  cells.resize(n);
 }
 
 // The dispatch file's lines, decoded to UTF-8.
@@ -92,12 +92,10 @@ void WriteXlsx(const std::vector<std::string>& lines, const std::string& xlsxPat
     if (lines[0] == kPostILHeader0) numericCol = 0;
     if (lines[0] == kPostILHeader1) numericCol = 10;
   }
-  std::vector<std::vector<std::string>> rows;
-  rows.reserve(lines.size());
   std::vector<size_t> widths;
+  std::vector<std::string> cells;
   for (const std::string& line : lines) {
-    rows.push_back(SplitCsvLine(line));
-    const auto& cells = rows.back();
+    SplitCsvLine(line, cells);
     if (widths.size() < cells.size()) widths.resize(cells.size(), 0);
     for (size_t c = 0; c < cells.size(); ++c) {
       widths[c] = std::max(widths[c], Utf8Length(cells[c]));
@@ -119,9 +117,10 @@ void WriteXlsx(const std::vector<std::string>& lines, const std::string& xlsxPat
     worksheet_set_column(ws, static_cast<lxw_col_t>(c), static_cast<lxw_col_t>(c), width, nullptr);
   }
   lxw_error err = LXW_NO_ERROR;
-  for (size_t r = 0; r < rows.size() && err == LXW_NO_ERROR; ++r) {
-    for (size_t c = 0; c < rows[r].size() && err == LXW_NO_ERROR; ++c) {
-      const std::string& cell = rows[r][c];
+  for (size_t r = 0; r < lines.size() && err == LXW_NO_ERROR; ++r) {
+    SplitCsvLine(lines[r], cells);
+    for (size_t c = 0; c < cells.size() && err == LXW_NO_ERROR; ++c) {
+      const std::string& cell = cells[c];
       if (cell.empty()) continue;
       double number = 0;
       const auto row = static_cast<lxw_row_t>(r);
