@@ -1,1 +1,43 @@
-int main() { return 0; }
+// zdrlab: with a command, the command line; with none, the window that hosts the panel.
+#include <cstdio>
+#include <string>
+#include <vector>
+
+#include "app/cli.h"
+#include "control/qtsettings.h"
+
+#ifdef ZDR_WITH_GUI
+#include "gui/mainwindow.h"
+#endif
+
+int main(int argc, char** argv) {
+  std::vector<std::string> args(argv + 1, argv + argc);
+  if (!args.empty() && zdr::IsCliCommand(args[0])) {
+    zdr::QtSettingsStore store;
+    return zdr::RunCli(args, store);
+  }
+  std::string company, screenshots;
+  for (size_t i = 0; i < args.size(); ++i) {
+    if (args[i] == "--help" || args[i] == "-h") {
+      zdr::QtSettingsStore store;
+      zdr::RunCli({}, store);
+      std::fputs("With no command, zdrlab opens its window: zdrlab [--company DIR]\n", stderr);
+      return 0;
+    }
+    if (args[i] == "--company" && i + 1 < args.size()) {
+      company = args[++i];
+    } else if (args[i] == "--screenshots" && i + 1 < args.size()) {
+      screenshots = args[++i];
+    } else {
+      std::fprintf(stderr, "zdrlab: unknown option %s (see zdrlab --help)\n", args[i].c_str());
+      return 2;
+    }
+  }
+#ifdef ZDR_WITH_GUI
+  if (!screenshots.empty()) return zdr::gui::RenderScreenshots(argc, argv, screenshots, company);
+  return zdr::gui::RunMainWindow(argc, argv, company);
+#else
+  std::fputs("zdrlab was built without its window; give a command (labels, list, post).\n", stderr);
+  return 2;
+#endif
+}

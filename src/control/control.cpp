@@ -1,1 +1,57 @@
-// Placeholder: filled as the part lands.
+#include "control/control.h"
+
+#include <exception>
+
+#include "control/settings.h"
+#include "import/importers.h"
+#include "workdb/schema.h"
+
+namespace zdr {
+
+Control::Control(SettingsStore& store, UserSeam& ui) : store_(store), ui_(ui) {}
+
+Control::~Control() = default;
+
+void Control::Initialize() {
+  // Every step may fail on its own; the panel always comes up.
+  try {
+    state_.companyPath = store_.Get(kSettingsApp, "Params", "ConnDataBase", DefaultConnDataBase());
+  } catch (const std::exception&) {
+  }
+  // The document types are built with the control; InitCmbDocType selects the first entry.
+  panel_.cmbDocType = 0;
+  try {
+    SetGetRegParams(2, store_, panel_);
+  } catch (const std::exception&) {
+  }
+  try {
+    SetGetRegLabelDefs(2, store_, labels_);
+  } catch (const std::exception&) {
+  }
+  try {
+    SetGetRegPostILDefs(2, store_, postIL_);
+  } catch (const std::exception&) {
+  }
+  state_.selectDbPath.clear();
+}
+
+void Control::CmdDef() {
+  try {
+    SetGetRegParams(1, store_, panel_);
+  } catch (const std::exception&) {
+  }
+}
+
+std::string Control::PrepareAccountPicker() {
+  const bool scan = state_.selectDbPath.empty() || ui_.AskYesNo("לסרוק מחדש את רשימת הכרטיסים?",
+                                                                kTitleAttention, MsgIcon::Question);
+  if (scan) {
+    state_.selectDbPath = CreateSelectDB(ui_);
+    ui_.SetStatus("קורא רשימת כרטיסים");
+    ReadACT(state_.companyPath, state_.selectDbPath, false, false, panel_, ui_);
+  }
+  state_.pickerSortIndex = static_cast<int16_t>(panel_.CmbSortBy);
+  return state_.selectDbPath;
+}
+
+}  // namespace zdr

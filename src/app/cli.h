@@ -1,0 +1,22 @@
+// The command line: `zdrlab labels|list|post [--company DIR] [--settings FILE]
+// [--set NAME=VALUE]... [--open]`.
+#pragma once
+
+#include <string>
+#include <vector>
+
+namespace zdr {
+
+class SettingsStore;
+class UserSeam;
+
+// True when `word` is one of the command line's commands.
+bool IsCliCommand(const std::string& word);
+
+// Runs one command with the arguments after the program name. `store` is used when no
+// --settings FILE is given. Prints the output's path on standard output and everything else
+// on standard error. Returns the process exit code: 0 when the command produced its file,
+// 1 when it failed, 2 for wrong usage.
+int RunCli(const std::vector<std::string>& args, SettingsStore& defaultStore);
+
+}  // namespace zdr
