@@ -84,7 +84,9 @@ struct TableDef {
 };
 
 // How carefully a database writes. The working database is thrown away at every load and
-// runs without journal or sync; the account-selection database holds the user's ticks.
+// runs without journal or sync; the account-selection database holds the user's ticks and
+// keeps a rollback journal with full sync. The choice is kept in the file and applies again
+// at every Open.
 enum class Durability { Scratch, Durable };
 
 class Database;
@@ -92,7 +94,8 @@ class Database;
 // Appends rows to one table. Opening it begins a transaction on its database (shared with
 // other recordsets open at the same time); the last recordset to close commits it, so the
 // rows appended stay even when the caller leaves through an exception. Rows are written
-// through one prepared statement.
+// through one prepared statement. A recordset shares the connection with its Database and
+// may outlive it: the file closes when both are gone. Not for use from two threads.
 class TableRecordset {
  public:
   TableRecordset(TableRecordset&&) noexcept;
@@ -103,7 +106,10 @@ class TableRecordset {
   void AddNew();
   // Index of a field by name, without regard to case; throws kErrNoSuchField.
   int FieldIndex(std::string_view name) const;
-  // Set a field of the new row. Text is UTF-8.
+  // Set a field of the new row (kErrNotEditing before AddNew). Text is UTF-8. A value of
+  // another type is converted as the desktop engine does: numbers become text, numeric text
+  // becomes a number (else kErrTypeConversion), any non-zero number a True (-1) Boolean, a
+  // fraction a whole number by round-half-even when the row is updated.
   void SetNull(int field);
   void SetText(int field, std::string_view utf8);
   void SetInt(int field, int64_t v);
@@ -111,10 +117,14 @@ class TableRecordset {
   void SetBool(int field, bool v);
   void SetDate(int field, Date d);
   void Set(std::string_view name, const Value& v);
-  // Checks the new row against the fields' types (zero-length text, width, number range)
-  // and inserts it. On failure nothing is stored and the row stays current.
+  // Checks the new row against the fields' types (zero-length text, width in characters,
+  // well-formed UTF-8, number range, Null in the primary key) and inserts it. On failure
+  // (kErrZeroLength, kErrFieldTooSmall, kErrTypeConversion, kErrNumericOverflow,
+  // kErrNullKey, kErrDuplicateKey) nothing is stored, the row stays current and the
+  // recordset and its transaction go on.
   void Update();
-  // Commits (when this is the last open recordset of its database).
+  // Commits (when this is the last open recordset of its database). Throws when the commit
+  // fails; the destructor closes the same way and keeps quiet.
   void Close();
 
  private:
@@ -129,7 +139,9 @@ class TableRecordset {
 #pragma push_macro("EOF")
 #undef EOF
 
-// The rows of a statement, read whole when it is opened.
+// The rows of a statement, read whole when it is opened; it needs no open database after
+// that. It starts on the first row (BOF and EOF together when there is none). Moving past
+// either end, or MoveFirst/MoveLast with no rows, throws kErrNoCurrentRecord.
 class Snapshot {
  public:
   Snapshot(Snapshot&&) noexcept;
@@ -144,8 +156,11 @@ class Snapshot {
   void MovePrevious();
   // Rows seen so far: complete after MoveLast, as with the desktop engine.
   int64_t RecordCount() const;
-  // Column index by result name, without regard to case; throws kErrNoSuchField.
+  // Column index by result name, without regard to case; throws kErrNoSuchField. A
+  // qualified name ("tStockHead.Reference1") finds the column Reference1 of that table.
   int FieldIndex(std::string_view name) const;
+  // The current row's value (kErrNoCurrentRecord at BOF or EOF). The reference stays valid
+  // until the next move or Close.
   const Value& Field(int index) const;
   const Value& Field(std::string_view name) const;
   int FieldCount() const;
@@ -163,12 +178,16 @@ class Snapshot {
 
 class Database {
  public:
-  // Creates a new database file; the file must not exist (callers delete an old one).
+  // Creates a new database file; the file must not exist (kErrFileExists: callers delete an
+  // old one). A journal left beside an earlier file of that name is removed first. A folder
+  // that is missing or not writable gives kErrCannotOpen.
   // The locale string is the desktop engine's (";LANGID=0x040D;CP=1255;COUNTRY=0" for
   // Hebrew); text fields compare by the Hebrew collation whatever it says.
   static Database Create(const std::filesystem::path& path, std::string_view locale,
                          Durability durability = Durability::Scratch);
-  // Opens an existing database file and resolves its linked tables.
+  // Opens an existing database file and resolves its linked tables. A missing or unreadable
+  // file, or one this engine did not create, gives kErrCannotOpen. A link whose file is
+  // missing does not stop the open; statements that read the link fail with kErrCannotOpen.
   static Database Open(const std::filesystem::path& path);
 
   Database(Database&&) noexcept;
@@ -181,7 +200,9 @@ class Database {
 
   void CreateTable(const TableDef& def);
   // A linked table `name` that reads table `sourceTable` of the database file `otherPath`.
-  // The link is kept in this file and resolved at every open.
+  // The link is kept in this file and resolved at every open; statements read the other
+  // file's current rows. A missing file (kErrCannotOpen) or table (kErrNoSuchObject) is
+  // refused at once and nothing is kept. Not while a recordset is open.
   void LinkTable(const std::string& name, const std::filesystem::path& otherPath,
                  const std::string& sourceTable);
   // A stored query with Jet SQL text, usable by name in later statements.

@@ -548,8 +548,11 @@ TEST_F(SnapshotTest, ExecuteReturnsRowsChangedAndKeepsFieldRules) {
   EXPECT_EQ(ErrorOf([&] { db_->Execute("UPDATE tAccount SET City = \"\""); }), kErrZeroLength);
   EXPECT_EQ(ErrorOf([&] { db_->Execute("UPDATE tAccount SET CategoryCode = \"אבגד\""); }),
             kErrFieldTooSmall);
-  EXPECT_EQ(ErrorOf([&] { db_->Execute("UPDATE tAccount SET SortByKey = \"1\""); }),
+  EXPECT_EQ(ErrorOf([&] { db_->Execute("UPDATE tAccount SET SortByKey = \"x\""); }),
             kErrDuplicateKey);
+  // The failed statement left no row half-changed.
+  EXPECT_EQ(Column(*db_, "SELECT SortByKey FROM tAccount ORDER BY AccountKey", "SortByKey"),
+            (std::vector<std::string>{"1", "2", "3"}));
 }
 
 // ---------------------------------------------------------------------------------------
