@@ -121,7 +121,7 @@ class MainCard : public QWidget {
   void CreateCSV(const std::string& pFileName, const std::string& pDBFile, int16_t pFileFormat);
 
   Control& control() { return *control_; }
-  UserSeam& seam() { return *seam_; }
+  QtSeam& seam() { return *seam_; }
   bool IsBusy() const { return busy_; }
 
   // The dialogs, created on first use (null before).

@@ -123,6 +123,7 @@ void QtSeam::SetStatus(std::string_view text) {
   status_.setText(ToQ(text));
   // The status line must show at once, also inside a loop that does not yield.
   status_.repaint();
+  if (statusObserver_) statusObserver_(status_.text());
 }
 
 void QtSeam::SetProgress(int fillWidth) {

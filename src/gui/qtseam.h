@@ -7,6 +7,7 @@
 #include <QFont>
 #include <QString>
 #include <QStringList>
+#include <functional>
 #include <string>
 #include <string_view>
 
@@ -97,11 +98,17 @@ class QtSeam : public UserSeam {
   bool OpenInBrowser(const std::string& path) override;
   bool OpenInSpreadsheet(const std::string& path) override;
 
+  // Called with every status text after it is shown (for a log or a test).
+  void SetStatusObserver(std::function<void(const QString&)> observer) {
+    statusObserver_ = std::move(observer);
+  }
+
  private:
   QLabel& status_;
   QProgressBar& progress_;
   Prompter& prompter_;
   DesktopOpener& opener_;
+  std::function<void(const QString&)> statusObserver_;
 };
 
 }  // namespace zdr::gui
