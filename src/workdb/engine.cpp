@@ -366,6 +366,8 @@ struct Database::Impl {
   std::shared_ptr<Connection> conn;
   fs::path path;
   std::vector<LinkState> links;
+  // Stored queries whose view could not be made at open, with the reason.
+  std::vector<std::pair<std::string, std::string>> brokenQueries;
   int nextLinkSchema = 1;
 
   sqlite3* db() const {
@@ -406,6 +408,12 @@ struct Database::Impl {
         if (EqualsNoCase(link.name, missing) && link.schema.empty()) {
           throw EngineError(kErrCannotOpen, "לא ניתן לקרוא את הטבלה המקושרת '" + link.name +
                                                 "' מהקובץ '" + link.path + "': " + link.failure);
+        }
+      }
+      for (const auto& [query, failure] : brokenQueries) {
+        if (EqualsNoCase(query, missing)) {
+          throw EngineError(kErrSyntax,
+                            "לא ניתן להריץ את השאילתה השמורה '" + query + "': " + failure);
         }
       }
       throw EngineError(kErrNoSuchObject, "הטבלה או השאילתה '" + missing +
@@ -503,6 +511,33 @@ struct Database::Impl {
     }
     link.schema = schema;
     link.failure.clear();
+  }
+
+  // Stored queries are temporary views made again at every open: a view kept in the file
+  // could not read a link, whose view is temporary too.
+  void CreateQueryView(const std::string& name, std::string_view jet) {
+    const std::string select = TranslateJetSql(jet);
+    Statement view;
+    Prepare("CREATE TEMP VIEW " + QuoteId(name) + " AS " + select, view, jet);
+    const int rc = sqlite3_step(view.get());
+    if (rc != SQLITE_DONE) throw StepFailure(db(), rc, jet);
+  }
+
+  void LoadQueries() {
+    Statement st;
+    const std::string sql = "SELECT name, jet FROM _zdr_queries ORDER BY rowid";
+    Prepare(sql, st, sql);
+    int rc;
+    while ((rc = sqlite3_step(st.get())) == SQLITE_ROW) {
+      const std::string name = reinterpret_cast<const char*>(sqlite3_column_text(st.get(), 0));
+      const std::string jet = reinterpret_cast<const char*>(sqlite3_column_text(st.get(), 1));
+      try {
+        CreateQueryView(name, jet);
+      } catch (const EngineError& e) {
+        brokenQueries.emplace_back(name, e.description());
+      }
+    }
+    if (rc != SQLITE_DONE) throw StepFailure(db(), rc, sql);
   }
 
   void LoadLinks() {
@@ -639,6 +674,7 @@ Database Database::Open(const fs::path& path) {
   }
   ExecOrThrow(h, durability == "scratch" ? kScratchPragmas : kDurablePragmas);
   impl->LoadLinks();
+  impl->LoadQueries();
   return Database(std::move(impl));
 }
 
@@ -854,26 +890,18 @@ void Database::CreateQuery(const std::string& name, std::string_view jetSql) {
   if (!impl_) throw EngineError(kErrEngine, "מסד הנתונים סגור.");
   Impl& d = *impl_;
   d.RefuseTakenName(name);
-  const std::string select = TranslateJetSql(jetSql);
-  const bool ownTransaction = sqlite3_get_autocommit(d.db()) != 0;
-  if (ownTransaction) d.Exec("BEGIN");
-  try {
-    Statement view;
-    d.Prepare("CREATE VIEW " + QuoteId(name) + " AS " + select, view, jetSql);
-    const int vrc = sqlite3_step(view.get());
-    if (vrc != SQLITE_DONE) throw StepFailure(d.db(), vrc, jetSql);
-    Statement st;
-    const std::string sql = "INSERT INTO _zdr_queries (name, jet) VALUES (?1, ?2)";
-    d.Prepare(sql, st, sql);
-    sqlite3_bind_text(st.get(), 1, name.c_str(), -1, SQLITE_STATIC);
-    sqlite3_bind_text(st.get(), 2, jetSql.data(), static_cast<int>(jetSql.size()), SQLITE_STATIC);
-    const int rc = sqlite3_step(st.get());
-    if (rc != SQLITE_DONE) throw StepFailure(d.db(), rc, sql);
-  } catch (...) {
-    if (ownTransaction) sqlite3_exec(d.db(), "ROLLBACK", nullptr, nullptr, nullptr);
-    throw;
+  d.CreateQueryView(name, jetSql);
+  Statement st;
+  const std::string sql = "INSERT INTO _zdr_queries (name, jet) VALUES (?1, ?2)";
+  d.Prepare(sql, st, sql);
+  sqlite3_bind_text(st.get(), 1, name.c_str(), -1, SQLITE_STATIC);
+  sqlite3_bind_text(st.get(), 2, jetSql.data(), static_cast<int>(jetSql.size()), SQLITE_STATIC);
+  const int rc = sqlite3_step(st.get());
+  if (rc != SQLITE_DONE) {
+    const EngineError error = StepFailure(d.db(), rc, sql);
+    sqlite3_exec(d.db(), ("DROP VIEW temp." + QuoteId(name)).c_str(), nullptr, nullptr, nullptr);
+    throw error;
   }
-  if (ownTransaction) d.Exec("COMMIT");
 }
 
 int64_t Database::Execute(std::string_view jetSql) {

@@ -602,6 +602,32 @@ TEST_F(EngineTest, LinkReadsTheOtherFilesCurrentRows) {
   EXPECT_EQ(linked.indexes[0].name, "AccountKey");
 }
 
+TEST_F(EngineTest, StoredQueryReadsALinkAfterReopen) {
+  const fs::path selectDb = File("zdracc.DB");
+  {
+    Database sel = Database::Create(selectDb, kLocale, Durability::Durable);
+    sel.CreateTable(TableDef("tSelectAccount")
+                        .Field("SortByKey", FieldType::Text, 20)
+                        .Field("Include", FieldType::Boolean));
+    TableRecordset rs = sel.OpenTable("tSelectAccount");
+    for (bool include : {true, false}) {
+      rs.AddNew();
+      rs.SetText(0, include ? "1" : "2");
+      rs.SetBool(1, include);
+      rs.Update();
+    }
+  }
+  {
+    Database work = Database::Create(File("zdrlab.DB"), kLocale);
+    work.LinkTable("tSelectAccount", selectDb, "tSelectAccount");
+    work.CreateQuery("qTicked", "SELECT SortByKey FROM tSelectAccount WHERE Include = True");
+    EXPECT_EQ(Count(work, "qTicked"), 1);
+  }
+  Database work = Database::Open(File("zdrlab.DB"));
+  EXPECT_EQ(Column(work, "SELECT SortByKey FROM qTicked", "SortByKey"),
+            std::vector<std::string>{"1"});
+}
+
 TEST_F(EngineTest, LinkToAMissingFileFailsAtOnceAndAtUse) {
   Database work = Database::Create(File("zdrlab.DB"), kLocale);
   EXPECT_EQ(ErrorOf([&] { work.LinkTable("tSelectAccount", File("none.DB"), "tSelectAccount"); }),
