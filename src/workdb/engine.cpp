@@ -1555,6 +1555,7 @@ const std::string& Snapshot::FieldName(int index) const {
 }
 
 void Snapshot::Close() {
+  if (!impl_) return;
   Impl& s = *impl_;
   s.cells.clear();
   s.cells.shrink_to_fit();
