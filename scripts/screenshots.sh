@@ -7,7 +7,9 @@ set -euo pipefail
 build="$1"; docs="$2"
 mkdir -p "$docs"
 docs="$(cd "$docs" && pwd)"
-work="$(mktemp -d)"
+# The sample lives in the build folder, so the chooser's folder tree shows project folders.
+work="$(cd "$build" && pwd)/screenshots-sample"
+rm -rf "$work"
 trap 'rm -rf "$work"' EXIT
 
 "$build/tools/zdrgen" --out "$work/companies" --companies 3 --seed 7 --accounts 60 \

@@ -15,6 +15,7 @@
 #include <QPushButton>
 #include <QStorageInfo>
 #include <QTableView>
+#include <QTimer>
 #include <QTreeView>
 #include <QVBoxLayout>
 #include <algorithm>
@@ -163,6 +164,15 @@ frmOpenDir::frmOpenDir(Control& control, QWidget* parent) : QDialog(parent), con
           [this](int i) { PathDrive_Change(pathDrive_->itemData(i).toString()); });
   connect(mainDir_->selectionModel(), &QItemSelectionModel::currentChanged, this,
           [this](const QModelIndex& current) { OnTreeCurrentChanged(current); });
+  // The folders are listed in the background and their rows arrive in batches; for a
+  // moment after the place is set, bring the current folder into view once they settle.
+  scrollTimer_ = new QTimer(this);
+  scrollTimer_->setSingleShot(true);
+  scrollTimer_->setInterval(150);
+  connect(scrollTimer_, &QTimer::timeout, this, [this] { ScrollToCurrentFolder(); });
+  connect(dirModel_, &QAbstractItemModel::rowsInserted, this, [this] {
+    if (placeSet_.isValid() && placeSet_.elapsed() < 3000) scrollTimer_->start();
+  });
   connect(cmbCompany_, &QListWidget::itemDoubleClicked, this, [this] { OKButton_Click(); });
   connect(ok, &QPushButton::clicked, this, [this] { OKButton_Click(); });
   connect(cancel, &QPushButton::clicked, this, [this] { CancelButton_Click(); });
@@ -219,12 +229,25 @@ void frmOpenDir::ShowFolder(const QString& folder) {
   dirModel_->setRootPath(root.isEmpty() ? QDir::rootPath() : root);
   const QModelIndex at = dirModel_->index(shown);
   if (at.isValid()) {
+    for (QModelIndex up = at.parent(); up.isValid(); up = up.parent()) mainDir_->expand(up);
     mainDir_->setCurrentIndex(at);
     mainDir_->expand(at);
-    mainDir_->scrollTo(at);
+    mainDir_->scrollTo(at, QAbstractItemView::PositionAtCenter);
   }
   currentFolder_ = shown;
   settingPlace_ = false;
+  placeSet_.start();
+}
+
+void frmOpenDir::ScrollToCurrentFolder() {
+  const QModelIndex at = mainDir_->currentIndex();
+  if (at.isValid()) mainDir_->scrollTo(at, QAbstractItemView::PositionAtCenter);
+}
+
+void frmOpenDir::showEvent(QShowEvent* event) {
+  QDialog::showEvent(event);
+  // Once the tree has its size.
+  scrollTimer_->start();
 }
 
 void frmOpenDir::OnTreeCurrentChanged(const QModelIndex& current) {
@@ -311,7 +334,7 @@ frmLogon::frmLogon(Control& control, frmOpenDir& openDir, QWidget* parent)
   auto* frame = new QGroupBox(QStringLiteral("ערכי התחברות"), this);
   frame->setObjectName(QStringLiteral("fraStep3"));
   txtConnDatabase_ = MakeEdit(QStringLiteral("txtConnDatabase"), frame);
-  txtConnDatabase_->setMinimumWidth(300);
+  txtConnDatabase_->setMinimumWidth(460);
   auto* open = MakeButton("cmdOpen", QStringLiteral("עיון..."), frame);
   auto* row = new QHBoxLayout(frame);
   row->addWidget(MakeLabel(QStringLiteral("מחיצה:"), frame, "lblStep3"));

@@ -10,6 +10,7 @@
 #include <QAbstractTableModel>
 #include <QCheckBox>
 #include <QDialog>
+#include <QElapsedTimer>
 #include <array>
 #include <cstdint>
 #include <string>
@@ -26,6 +27,7 @@ class QListWidget;
 class QModelIndex;
 class QPushButton;
 class QTableView;
+class QTimer;
 class QTreeView;
 
 namespace zdr {
@@ -98,9 +100,11 @@ class frmOpenDir : public QDialog {
 
  protected:
   void closeEvent(QCloseEvent* event) override;
+  void showEvent(QShowEvent* event) override;
 
  private:
   void FillDrives();
+  void ScrollToCurrentFolder();
   void ShowFolder(const QString& folder);
   void OnTreeCurrentChanged(const QModelIndex& current);
 
@@ -109,6 +113,8 @@ class frmOpenDir : public QDialog {
   bool settingPlace_ = false;  // Load and the drive change set the tree without rescanning
   CompanyScan scan_;
   QString currentFolder_;
+  QElapsedTimer placeSet_;  // since the program last set the folder
+  QTimer* scrollTimer_;
   QComboBox* pathDrive_;
   QTreeView* mainDir_;
   QFileSystemModel* dirModel_;

@@ -63,9 +63,9 @@ void Settle(int milliseconds) {
   }
 }
 
-bool Save(QWidget& w, const QString& dir, const QString& name) {
+bool Save(QWidget& w, const QString& dir, const QString& name, int settleMs = 300) {
   w.show();
-  Settle(300);
+  Settle(settleMs);
   const QString path = QDir(dir).filePath(name + QStringLiteral(".png"));
   const bool ok = w.grab().save(path, "PNG");
   if (!ok) std::cerr << "cannot write " << path.toStdString() << "\n";
@@ -120,7 +120,8 @@ int RenderScreenshots(int& argc, char** argv, const std::string& outDir,
     openDir->MainDir_Change(ToQ(parent.string()));
     if (openDir->cmbCompany()->count() > 0) openDir->cmbCompany()->setCurrentRow(0);
   }
-  ok = Save(*openDir, dir, QStringLiteral("frmOpenDir")) && ok;
+  // The folder tree lists its folders in the background.
+  ok = Save(*openDir, dir, QStringLiteral("frmOpenDir"), 2000) && ok;
 
   frmLabDef* labDef = card->labDefDialog();
   labDef->Load();

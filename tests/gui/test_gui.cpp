@@ -12,6 +12,7 @@
 #include <QPushButton>
 #include <QTableView>
 #include <QTimer>
+#include <QTreeView>
 #include <deque>
 #include <filesystem>
 #include <fstream>
