@@ -44,8 +44,10 @@ bool IsDeleted(std::string_view keyField) {
 // A sort-code bound of one or two characters is padded with leading spaces to the code's
 // width of three, as the host stores short codes.
 std::string PadSortBound(std::string bound) {
-  if (!bound.empty() && bound.size() < 3) bound.insert(0, 3 - bound.size(), ' ');
-  return bound;
+  if (bound.empty() || bound.size() >= 3) return bound;
+  std::string padded(3 - bound.size(), ' ');
+  padded.append(bound);
+  return padded;
 }
 
 // The account criteria, read from the panel once before the loop.
@@ -107,7 +109,7 @@ AccountCriteria AccountCriteria::FromPanel(Panel& panel) {
   }
   if (Panel::On(panel.chkCutOff)) {
     for (int j = 1; j <= 4; ++j) {
-      if (panel.CutOff[j].empty()) panel.CutOff[j] = " ";
+      if (panel.CutOff[j].empty()) panel.CutOff[j].assign(1, ' ');
       std::string letter = ToHostLetter(importing::PanelText(panel.CutOff[j]));
       c.cutOff[j] = letter.empty() ? ' ' : letter[0];
       if (panel.CutOff[j] != "*") c.useCutOff = true;

@@ -77,8 +77,10 @@ void ReadAllTempTrans(const std::string& CompPath, const std::string& pDBFile, c
 
 int16_t ReadTempTransactions(const std::string& CompPath, const std::string& pDBFile,
                              int16_t pJournalNo, const Panel& panel, UserSeam& ui) {
-  return ReadTempTransactions(CompPath, pDBFile, pJournalNo,
-                              "a" + std::to_string(pJournalNo) + ".tmp", panel, ui);
+  std::string name = "a";
+  name += std::to_string(pJournalNo);
+  name += ".tmp";
+  return ReadTempTransactions(CompPath, pDBFile, pJournalNo, name, panel, ui);
 }
 
 int16_t ReadTempTransactions(const std::string& CompPath, const std::string& pDBFile,
