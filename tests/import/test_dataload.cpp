@@ -3,6 +3,7 @@
 
 #include <gtest/gtest.h>
 
+#include <set>
 #include <string>
 #include <vector>
 
@@ -191,6 +192,50 @@ TEST_F(DataLoad, LinksTheSelectionTableOnceThePickerWasUsed) {
   ASSERT_FALSE(state_.selectDbPath.empty());
   Load();
   EXPECT_EQ(Count(state_.workDbPath, "tSelectAccount"), 0);
+}
+
+// A generated company of ordinary size: every live account with a key of its own becomes one
+// row, and every distinct account of a ledger transaction or batch one tTransact row.
+TEST_F(DataLoad, GeneratedCompanyRowsMatchWhatWasWritten) {
+  zdrgen::Options options;
+  const zdrgen::CompanyTruth truth =
+      zdrgen::WriteCompany(root_ / "generated", options, "חברה לדוגמה");
+  state_.companyPath = truth.folder.string();
+  panel_.chkTransType = 1;
+  panel_.txtTransType = "*";
+  panel_.chkReadTempTrans = 1;
+  Load(false);
+  EXPECT_TRUE(seam_.messages.empty()) << seam_.messages[0].text;
+
+  int64_t accounts = 0;
+  std::set<std::string> stored;
+  for (const std::string& k :
+       ImportTest::Rows(state_.workDbPath, "SELECT AccountKey FROM tAccount")) {
+    stored.insert(k);
+  }
+  for (const auto& a : truth.accounts) {
+    if (a.deleted || a.duplicateKey) continue;
+    ++accounts;
+    if (a.unambiguousKey) {
+      EXPECT_TRUE(stored.count(a.key)) << a.key;
+    }
+  }
+  EXPECT_EQ(Rows("tAccount"), accounts);
+
+  auto distinctKeys = [&](const std::array<int, 4>& entries) {
+    std::set<std::string> keys;
+    for (int idx : entries) {
+      if (idx >= 0) keys.insert(truth.accounts[static_cast<size_t>(idx)].key);
+    }
+    return static_cast<int64_t>(keys.size());
+  };
+  int64_t transacts = 0;
+  for (const auto& t : truth.ledger) transacts += distinctKeys(t.accountIndex);
+  for (const auto& b : truth.batches) {
+    if (b.number == 0) continue;
+    for (const auto& t : b.transactions) transacts += distinctKeys(t.accountIndex);
+  }
+  EXPECT_EQ(Rows("tTransact"), transacts);
 }
 
 }  // namespace
