@@ -39,7 +39,7 @@ std::string ReadCompanyName(const fs::path& descriptor) {
 CompanyScan FindTavPaths(const std::string& pDrive) {
   CompanyScan scan;
   std::string base = pDrive;
-  if (base.empty() || base.back() != '/') base += '/';
+  if (base.empty() || (base.back() != '/' && base.back() != '\\')) base += '/';
 
   std::vector<std::string> folders;
   try {

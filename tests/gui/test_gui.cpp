@@ -2,6 +2,7 @@
 // message boxes, file choosers and desktop.
 #include <gtest/gtest.h>
 #include <stdlib.h>
+#include <unistd.h>
 
 #include <QApplication>
 #include <QComboBox>
@@ -468,6 +469,17 @@ class OutputCommandTest : public GuiTest {
 };
 
 TEST_F(OutputCommandTest, LabelSheetIsWrittenAndOpened) {
+  // A command clicked while another runs is refused.
+  bool triedSave = false;
+  card_->seam().SetStatusObserver([this, &triedSave](const QString& s) {
+    statuses_.push_back(s);
+    busyWhileRunning_ = busyWhileRunning_ && !Find<QPushButton>(*card_, "CmdDef")->isEnabled();
+    if (!triedSave) {
+      triedSave = true;
+      card_->CmdDef_Click();
+      EXPECT_TRUE(card_->CmdPreview_Click().empty());
+    }
+  });
   const std::string produced = card_->CmdLabPrev_Click();
   const fs::path expected = temp_.path() / "zdrlab1.htm";
   EXPECT_EQ(fs::path(produced), expected);
@@ -480,6 +492,8 @@ TEST_F(OutputCommandTest, LabelSheetIsWrittenAndOpened) {
     EXPECT_TRUE(Saw(s)) << s;
   EXPECT_EQ(card_->LblMessage()->text(), Q("הכנת הרשימה הסתיימה"));
   EXPECT_TRUE(busyWhileRunning_);
+  EXPECT_TRUE(store_.Values().empty());
+  EXPECT_FALSE(fs::exists(temp_.path() / "zdrlab2.htm"));
   EXPECT_TRUE(Find<QPushButton>(*card_, "CmdLabPrev")->isEnabled());
   EXPECT_EQ(card_->ProgressFill()->value(), 0);
   EXPECT_TRUE(prompter_.shown.empty()) << prompter_.shown[0].text;
@@ -590,6 +604,26 @@ TEST_F(PickerTest, FirstOpenScansWithoutAskingSecondAsks) {
   card_->cmdSelectAccount_Click();
   EXPECT_EQ(prompter_.asked.size(), 2u);
   EXPECT_EQ(tickedAfterYes, rows);
+}
+
+TEST_F(PickerTest, PickerIsNotShownWhenItsDatabaseCannotBeCreated) {
+  const fs::path notAFolder = temp_.path() / "file";
+  std::ofstream(notAFolder) << "x";
+  setenv("Temp", notAFolder.c_str(), 1);
+  bool shown = false;
+  QTimer::singleShot(0, [&] {
+    if (QWidget* d = QApplication::activeModalWidget()) {
+      shown = true;
+      d->close();
+    }
+  });
+  card_->cmdSelectAccount_Click();
+  QCoreApplication::processEvents();
+  EXPECT_FALSE(shown);
+  ASSERT_FALSE(prompter_.shown.empty());
+  EXPECT_EQ(prompter_.shown[0].title, "תקלה");
+  EXPECT_TRUE(card_->control().state().selectDbPath.empty());
+  EXPECT_TRUE(Find<QPushButton>(*card_, "cmdSelectAccount")->isEnabled());
 }
 
 TEST_F(PickerTest, OrderFollowsTheSortChoiceAndFindByDescriptionNarrows) {
