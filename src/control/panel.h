@@ -75,7 +75,6 @@ inline constexpr std::array<std::string_view, 2> kByDocEntries{"הופק", "לא
 inline constexpr std::array<std::string_view, 8> kSortByEntries{
     "מפתח כרטיס", "שם כרטיס", "עיר", "מיקוד", "טלפון", "קוד מיון", "כרטיס ספרתי", "מספר מסמך"};
 inline constexpr std::array<std::string_view, 2> kSortDirEntries{"עולה", "יורד"};
-inline constexpr std::array<std::string_view, 2> kAddressFromEntries{"כותרת המסמך",
-                                                                     "כרטיס החשבון"};
+inline constexpr std::array<std::string_view, 2> kAddressFromEntries{"כותרת המסמך", "כרטיס החשבון"};
 
 }  // namespace zdr

@@ -57,7 +57,7 @@ std::optional<int16_t> BatchNumberOf(std::string_view name) {
 }  // namespace
 
 void ReadAllTempTrans(const std::string& CompPath, const std::string& pDBFile, const Panel& panel,
-                      UserSeam& ui) {
+                      UserSeam& ui, bool pAsIs) {
   const importing::JournalRange journals = importing::JournalRange::FromPanel(panel);
 
   // Listed in the order the folder gives them. A folder that cannot be listed has no batches.
@@ -71,21 +71,21 @@ void ReadAllTempTrans(const std::string& CompPath, const std::string& pDBFile, c
     const std::optional<int16_t> batch = BatchNumberOf(name);
     if (!batch || *batch == 0 || !journals.Contains(*batch)) continue;
     // The file the listing found is read: a012.tmp is batch 12 but is not the file a12.tmp.
-    ReadTempTransactions(CompPath, pDBFile, *batch, name, panel, ui);
+    ReadTempTransactions(CompPath, pDBFile, *batch, name, panel, ui, pAsIs);
   }
 }
 
 int16_t ReadTempTransactions(const std::string& CompPath, const std::string& pDBFile,
-                             int16_t pJournalNo, const Panel& panel, UserSeam& ui) {
+                             int16_t pJournalNo, const Panel& panel, UserSeam& ui, bool pAsIs) {
   std::string name = "a";
   name += std::to_string(pJournalNo);
   name += ".tmp";
-  return ReadTempTransactions(CompPath, pDBFile, pJournalNo, name, panel, ui);
+  return ReadTempTransactions(CompPath, pDBFile, pJournalNo, name, panel, ui, pAsIs);
 }
 
 int16_t ReadTempTransactions(const std::string& CompPath, const std::string& pDBFile,
                              int16_t pJournalNo, const std::string& pFileName, const Panel& panel,
-                             UserSeam& ui) {
+                             UserSeam& ui, bool pAsIs) {
   try {
     importing::LedgerFilter filter(panel);
 
@@ -95,7 +95,7 @@ int16_t ReadTempTransactions(const std::string& CompPath, const std::string& pDB
     ProgressReporter progress(ui, static_cast<double>(n));
     db::Database db = db::Database::Open(pDBFile);
     db::TableRecordset rs = db.OpenTable("tTransact");
-    importing::TransactWriter writer(rs);
+    importing::TransactWriter writer(rs, pAsIs);
 
     for (int64_t i = 1; i <= n; ++i) {
       std::string_view rec = importing::RecordOf(file, i);

@@ -30,7 +30,7 @@ std::optional<Date> DateBound(const Panel& panel, const std::string& typed) {
 }  // namespace
 
 int16_t ReadCash(const std::string& CompPath, const std::string& pDBFile, const Panel& panel,
-                 UserSeam& ui) {
+                 UserSeam& ui, bool pAsIs) {
   try {
     const std::optional<Date> from = DateBound(panel, panel.TxtFromDate);
     const std::optional<Date> to = DateBound(panel, panel.TxtToDate);
@@ -48,7 +48,8 @@ int16_t ReadCash(const std::string& CompPath, const std::string& pDBFile, const 
       std::string_view rec = importing::RecordOf(file, i);
       const Date date = importing::DateAt(rec, kDateAt);
       if (!(from && date < *from) && !(to && date > *to)) {
-        std::string key = ReverseAndMirror(FieldOf(rec, kKeyAt, kKeyLen));
+        // Keys match tAccount's: converted as the account import of this load converts them.
+        std::string key = ConvertForDisplay(FieldOf(rec, kKeyAt, kKeyLen), pAsIs);
         std::string_view trimmed = TrimSpaces(key);
         if (!trimmed.empty()) {
           rs.AddNew();

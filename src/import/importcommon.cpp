@@ -190,14 +190,16 @@ JournalRange JournalRange::FromPanel(const Panel& panel) {
   return r;
 }
 
-TransactWriter::TransactWriter(db::TableRecordset& rs)
+TransactWriter::TransactWriter(db::TableRecordset& rs, bool asIs)
     : rs_(rs),
       fileId_(rs.FieldIndex("FileID")),
       transId_(rs.FieldIndex("TransID")),
-      key_(rs, "AccountKey") {}
+      key_(rs, "AccountKey"),
+      asIs_(asIs) {}
 
 void TransactWriter::Add(int32_t fileId, int32_t transId, std::string_view keyField) {
-  std::string key = ReverseAndMirror(keyField);
+  // As-is, this is the key reversed with its brackets mirrored, trimmed.
+  std::string key = ConvertForDisplay(keyField, asIs_);
   std::string_view trimmed = TrimSpaces(key);
   if (trimmed.empty()) return;
   rs_.AddNew();

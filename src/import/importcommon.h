@@ -116,13 +116,15 @@ struct JournalRange {
 // ReverseAndMirror and trimmed, blank ones passed over, repeated ones passed over.
 class TransactWriter {
  public:
-  explicit TransactWriter(db::TableRecordset& rs);
+  // `asIs` converts the account keys as the account import of the same load does.
+  TransactWriter(db::TableRecordset& rs, bool asIs);
   void Add(int32_t fileId, int32_t transId, std::string_view keyField);
 
  private:
   db::TableRecordset& rs_;
   int fileId_, transId_;
   TextColumn key_;
+  bool asIs_;
 };
 
 }  // namespace zdr::importing

@@ -55,30 +55,36 @@ int32_t ReadStock(int16_t pCompID, const std::string& pCompPath, const std::stri
 // Ledger transactions of amv.fix that pass the journal range, the type pattern and both date
 // ranges into tTransact with FileID -1, one row per account entry. Returns -1 when the file was
 // read to its end, 0 after showing a failure (information icon, "תקלה").
+//
+// The account keys of the receipt, ledger and batch imports are converted as the account
+// import of the same load converts its keys (`pAsIs`), so that they match tAccount's: with
+// the as-is flag off a key of digits stays in stored order on both sides. The default, on,
+// reverses the key and mirrors its brackets.
 int16_t ReadTransactions(const std::string& CompPath, const std::string& pDBFile,
-                         const Panel& panel, UserSeam& ui);
+                         const Panel& panel, UserSeam& ui, bool pAsIs = true);
 
 // Lists the company's temporary batches (a<number>.tmp, any case) and reads each whose number
 // is not 0 and lies in the panel's journal range with ReadTempTransactions. Names whose middle
 // is not a number, or a number outside the 16-bit range, are passed over. Throws what it does
 // not handle itself: a journal bound that is not a 16-bit whole number.
 void ReadAllTempTrans(const std::string& CompPath, const std::string& pDBFile, const Panel& panel,
-                      UserSeam& ui);
+                      UserSeam& ui, bool pAsIs = true);
 
 // Transactions of batch `pJournalNo` (the file a<pJournalNo>.tmp) that pass the type pattern
 // and both date ranges into tTransact with FileID pJournalNo. Returns -1 / 0 as
 // ReadTransactions, with the same failure message.
 int16_t ReadTempTransactions(const std::string& CompPath, const std::string& pDBFile,
-                             int16_t pJournalNo, const Panel& panel, UserSeam& ui);
+                             int16_t pJournalNo, const Panel& panel, UserSeam& ui,
+                             bool pAsIs = true);
 // The same for the batch file `pFileName` (a name in CompPath, as the listing found it, looked
 // up without regard to case), whose rows carry `pJournalNo`.
 int16_t ReadTempTransactions(const std::string& CompPath, const std::string& pDBFile,
                              int16_t pJournalNo, const std::string& pFileName, const Panel& panel,
-                             UserSeam& ui);
+                             UserSeam& ui, bool pAsIs = true);
 
 // Cash receipts of icash2.fix dated within the panel's document dates (when ChkDates is on;
 // any non-empty date text is a bound) into tCash. Returns -1 / 0 as ReadTransactions.
 int16_t ReadCash(const std::string& CompPath, const std::string& pDBFile, const Panel& panel,
-                 UserSeam& ui);
+                 UserSeam& ui, bool pAsIs = true);
 
 }  // namespace zdr

@@ -34,7 +34,7 @@ int16_t JournalOf(std::string_view rec) {
 }  // namespace
 
 int16_t ReadTransactions(const std::string& CompPath, const std::string& pDBFile,
-                         const Panel& panel, UserSeam& ui) {
+                         const Panel& panel, UserSeam& ui, bool pAsIs) {
   try {
     const importing::JournalRange journals = importing::JournalRange::FromPanel(panel);
     importing::LedgerFilter filter(panel);
@@ -45,7 +45,7 @@ int16_t ReadTransactions(const std::string& CompPath, const std::string& pDBFile
     ProgressReporter progress(ui, static_cast<double>(n));
     db::Database db = db::Database::Open(pDBFile);
     db::TableRecordset rs = db.OpenTable("tTransact");
-    importing::TransactWriter writer(rs);
+    importing::TransactWriter writer(rs, pAsIs);
 
     for (int64_t i = 1; i <= n; ++i) {
       std::string_view rec = importing::RecordOf(file, i);
