@@ -38,8 +38,6 @@
 #include "workdb/schema.h"
 #include "zdrgen/generator.h"
 
-#undef EOF
-
 namespace {
 
 namespace fs = std::filesystem;
@@ -308,7 +306,7 @@ Captured Capture(const std::vector<std::string>& tables,
     CapturedTable t;
     t.def = db.Describe(name);
     db::Snapshot s = db.OpenSnapshot("SELECT * FROM " + name);
-    while (!s.EOF()) {
+    while (!s.AtEnd()) {
       std::vector<db::Value> row;
       for (int i = 0; i < s.FieldCount(); ++i) row.push_back(s.Field(i));
       t.rows.push_back(std::move(row));

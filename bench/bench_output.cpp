@@ -12,9 +12,6 @@
 #include "select/select.h"
 #include "workdb/schema.h"
 
-#ifdef EOF
-#undef EOF
-#endif
 #include "workdb/engine.h"
 
 namespace {

@@ -30,10 +30,6 @@
 #include "select/picker.h"
 #include "workdb/engine.h"
 
-// The snapshot's end test is named EOF, as the C library's end-of-file macro; nothing here
-// needs the macro.
-#undef EOF
-
 namespace zdr::gui {
 
 namespace {
@@ -718,8 +714,8 @@ bool PickerModel::Refresh() {
     const int key = snap.FieldIndex("SortByKey");
     const int name = snap.FieldIndex("SortByName");
     const int include = snap.FieldIndex("Include");
-    if (!snap.EOF()) snap.MoveFirst();
-    while (!snap.EOF()) {
+    if (!snap.AtEnd()) snap.MoveFirst();
+    while (!snap.AtEnd()) {
       rows.push_back(
           {TextOf(snap.Field(key)), TextOf(snap.Field(name)), TrueOf(snap.Field(include))});
       snap.MoveNext();

@@ -3,10 +3,6 @@
 #include "output/output.h"
 #include "select/select.h"
 
-// Recordsets have an EOF() member, which the C library's EOF macro would rewrite.
-#ifdef EOF
-#undef EOF
-#endif
 #include "workdb/engine.h"
 
 namespace zdr {
@@ -64,7 +60,7 @@ void CreateHTML(const std::string& pFileName, const std::string& pDBFile, const 
 
   db::Database database = db::Database::Open(pDBFile);
   db::Snapshot rs = database.OpenSnapshot(BuildRecipientsStatement(panel, docTypes, selectDbPath));
-  if (rs.BOF() || rs.EOF()) {  // either, right after opening: no rows
+  if (rs.AtStart() || rs.AtEnd()) {  // either, right after opening: no rows
     // No recipients: the page stops after the column headings.
     f.Close();
     return;
@@ -85,7 +81,7 @@ void CreateHTML(const std::string& pFileName, const std::string& pDBFile, const 
   ProgressReporter progress(ui, static_cast<double>(count));
   int64_t rows = 0;
   std::string line;
-  while (!rs.EOF()) {
+  while (!rs.AtEnd()) {
     ++rows;
     f.Line("  <tr valign='middle' bgcolor='#FFFFFF' align='right'>");
     CellLine(f, line, "    <td>", rs.Field(zip));

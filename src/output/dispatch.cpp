@@ -7,10 +7,6 @@
 #include "output/output.h"
 #include "select/select.h"
 
-// Recordsets have an EOF() member, which the C library's EOF macro would rewrite.
-#ifdef EOF
-#undef EOF
-#endif
 #include "workdb/engine.h"
 
 namespace zdr {
@@ -137,8 +133,8 @@ void CreateCSV(const std::string& pFileName, const std::string& pDBFile, int16_t
 
   db::Database database = db::Database::Open(pDBFile);
   db::Snapshot rs = database.OpenSnapshot(BuildRecipientsStatement(panel, docTypes, selectDbPath));
-  if (rs.BOF() || rs.EOF()) {  // either, right after opening: no rows
-    f.Close();                 // no recipients: an empty file, not even a header
+  if (rs.AtStart() || rs.AtEnd()) {  // either, right after opening: no rows
+    f.Close();                       // no recipients: an empty file, not even a header
     return;
   }
   rs.MoveLast();
@@ -161,7 +157,7 @@ void CreateCSV(const std::string& pFileName, const std::string& pDBFile, int16_t
   rs.MoveFirst();
   int64_t rows = 0;
   std::string line;
-  while (!rs.EOF()) {
+  while (!rs.AtEnd()) {
     ++rows;
     line.clear();
     if (pFileFormat == 0) {

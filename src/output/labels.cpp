@@ -5,10 +5,6 @@
 #include "output/output.h"
 #include "select/select.h"
 
-// Recordsets have an EOF() member, which the C library's EOF macro would rewrite.
-#ifdef EOF
-#undef EOF
-#endif
 #include "workdb/engine.h"
 
 namespace zdr {
@@ -122,7 +118,7 @@ class SheetWriter {
   void WriteCell(bool skipped) {
     f_.Line(cellOpen_);
     f_.Line("     <table border='0' cellpadding='1' cellspacing='0' dir='rtl'>");
-    if (!rs_.EOF() && !skipped) {
+    if (!rs_.AtEnd() && !skipped) {
       WriteLabel();
       if (++copy_ == g_.copies) {
         copy_ = 0;
@@ -210,7 +206,7 @@ void CreateLabFile(const std::string& pFileName, const std::string& pDBFile, con
 
   db::Database database = db::Database::Open(pDBFile);
   db::Snapshot rs = database.OpenSnapshot(BuildRecipientsStatement(panel, docTypes, selectDbPath));
-  if (rs.BOF() || rs.EOF()) {  // either, right after opening: no rows
+  if (rs.AtStart() || rs.AtEnd()) {  // either, right after opening: no rows
     // No recipients: the page stops after the BODY line.
     f.Close();
     return;

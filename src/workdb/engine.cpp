@@ -2,11 +2,6 @@
 
 #include <sqlite3.h>
 
-// Snapshot has an EOF() member, which the C library's EOF macro would rewrite.
-#ifdef EOF
-#undef EOF
-#endif
-
 #include <algorithm>
 #include <charconv>
 #include <cmath>
@@ -1470,10 +1465,10 @@ Snapshot Database::OpenSnapshot(std::string_view jetSql) {
   return Snapshot(std::move(snap));
 }
 
-bool Snapshot::BOF() const {
+bool Snapshot::AtStart() const {
   return impl_->pos < 0 || impl_->rowStart.empty();
 }
-bool Snapshot::EOF() const {
+bool Snapshot::AtEnd() const {
   return impl_->rowStart.empty() || impl_->pos >= impl_->RowCount();
 }
 
@@ -1488,12 +1483,12 @@ void Snapshot::MoveLast() {
 }
 
 void Snapshot::MoveNext() {
-  if (EOF()) throw EngineError(kErrNoCurrentRecord, "אין רשומה נוכחית.");
+  if (AtEnd()) throw EngineError(kErrNoCurrentRecord, "אין רשומה נוכחית.");
   impl_->MoveTo(impl_->pos + 1);
 }
 
 void Snapshot::MovePrevious() {
-  if (BOF()) throw EngineError(kErrNoCurrentRecord, "אין רשומה נוכחית.");
+  if (AtStart()) throw EngineError(kErrNoCurrentRecord, "אין רשומה נוכחית.");
   impl_->MoveTo(impl_->pos - 1);
 }
 
@@ -1535,7 +1530,7 @@ const Value& Snapshot::Field(int index) const {
   if (index < 0 || index >= FieldCount()) {
     throw EngineError(kErrNoSuchField, "אין שדה במקום " + std::to_string(index) + " בתוצאה.");
   }
-  if (BOF() || EOF()) throw EngineError(kErrNoCurrentRecord, "אין רשומה נוכחית.");
+  if (AtStart() || AtEnd()) throw EngineError(kErrNoCurrentRecord, "אין רשומה נוכחית.");
   return impl_->current[static_cast<size_t>(index)];
 }
 

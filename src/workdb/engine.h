@@ -134,13 +134,8 @@ class TableRecordset {
   std::unique_ptr<Impl> impl_;
 };
 
-// The C library's EOF macro would rewrite the EOF() member below; this header hides it only
-// while it declares the member. Files that call EOF() undefine the macro themselves.
-#pragma push_macro("EOF")
-#undef EOF
-
 // The rows of a statement, read whole when it is opened; it needs no open database after
-// that. It starts on the first row (BOF and EOF together when there is none). Moving past
+// that. It starts on the first row (at start and at end together when there is none). Moving past
 // either end, or MoveFirst/MoveLast with no rows, throws kErrNoCurrentRecord.
 class Snapshot {
  public:
@@ -148,8 +143,8 @@ class Snapshot {
   Snapshot& operator=(Snapshot&&) noexcept;
   ~Snapshot();
 
-  bool BOF() const;  // before the first row (also when there are none)
-  bool EOF() const;  // after the last row (also when there are none)
+  bool AtStart() const;  // before the first row (also when there are none)
+  bool AtEnd() const;    // after the last row (also when there are none)
   void MoveFirst();
   void MoveLast();
   void MoveNext();
@@ -159,7 +154,7 @@ class Snapshot {
   // Column index by result name, without regard to case; throws kErrNoSuchField. A
   // qualified name ("tStockHead.Reference1") finds the column Reference1 of that table.
   int FieldIndex(std::string_view name) const;
-  // The current row's value (kErrNoCurrentRecord at BOF or EOF). The reference stays valid
+  // The current row's value (kErrNoCurrentRecord at start or at end). The reference stays valid
   // until the next move or Close.
   const Value& Field(int index) const;
   const Value& Field(std::string_view name) const;
@@ -173,8 +168,6 @@ class Snapshot {
   explicit Snapshot(std::unique_ptr<Impl> impl);
   std::unique_ptr<Impl> impl_;
 };
-
-#pragma pop_macro("EOF")
 
 class Database {
  public:

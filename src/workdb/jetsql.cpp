@@ -9,11 +9,7 @@
 #include <string>
 #include <vector>
 
-// Declared with <cstdio>'s EOF macro out of the way (Snapshot::EOF()).
-#pragma push_macro("EOF")
-#undef EOF
 #include "workdb/engine.h"
-#pragma pop_macro("EOF")
 
 namespace zdr::db {
 namespace {

@@ -7,11 +7,7 @@
 #include <vector>
 
 #include "control/userseam.h"
-// Declared with <cstdio>'s EOF macro out of the way (Snapshot::EOF()).
-#pragma push_macro("EOF")
-#undef EOF
 #include "workdb/engine.h"
-#pragma pop_macro("EOF")
 
 namespace zdr {
 

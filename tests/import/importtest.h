@@ -18,9 +18,6 @@
 #include "workdb/schema.h"
 #include "zdrgen/generator.h"
 
-// Snapshot::EOF() is called below; the C library defines EOF as a macro.
-#undef EOF
-
 namespace zdr::importtest {
 
 struct ShownMessage {
@@ -86,7 +83,7 @@ class ImportTest : public ::testing::Test {
     db::Database db = db::Database::Open(dbPath);
     db::Snapshot snap = db.OpenSnapshot(sql);
     std::vector<std::string> rows;
-    while (!snap.EOF()) {
+    while (!snap.AtEnd()) {
       std::string row;
       for (int i = 0; i < snap.FieldCount(); ++i) {
         if (i > 0) row += '|';

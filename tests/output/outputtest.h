@@ -21,9 +21,6 @@
 #include "output/outputdefs.h"
 #include "workdb/schema.h"
 
-#ifdef EOF
-#undef EOF
-#endif
 #include "workdb/engine.h"
 
 namespace zdr::testing {

@@ -31,9 +31,6 @@
 #include "workdb/schema.h"
 #include "zdrgen/generator.h"
 
-// Snapshot::EOF() is called below; <cstdio> defines EOF as a macro.
-#undef EOF
-
 namespace zdr {
 namespace {
 
@@ -121,7 +118,7 @@ class RowsTest : public ::testing::Test {
     db::Snapshot s =
         db.OpenSnapshot(BuildRecipientsStatement(panel_, docTypes_, state_.selectDbPath));
     std::vector<Row> rows;
-    for (; !s.EOF(); s.MoveNext()) {
+    for (; !s.AtEnd(); s.MoveNext()) {
       Row r;
       r.accountKey = TextOf(s.Field("AccountKey")).value_or("<null>");
       r.accountName = TextOf(s.Field("AccountName")).value_or("<null>");
@@ -297,7 +294,7 @@ TEST_F(GeneratedRows, HandPickedAccountsInAndNotIn) {
   {
     db::Database select = db::Database::Open(state_.selectDbPath);
     db::Snapshot s = select.OpenSnapshot("SELECT SortByKey FROM tSelectAccount");
-    for (int n = 0; !s.EOF(); s.MoveNext(), ++n) {
+    for (int n = 0; !s.AtEnd(); s.MoveNext(), ++n) {
       (n % 3 == 0 ? unticked : ticked).insert(*TextOf(s.Field(0)));
     }
     for (const std::string& key : unticked) {

@@ -13,11 +13,6 @@
 #include "workdb/collation.h"
 #include "workdb/engine.h"
 
-// Snapshot::EOF() would be rewritten by the C library's EOF macro.
-#ifdef EOF
-#undef EOF
-#endif
-
 namespace zdr::db {
 namespace {
 
@@ -91,7 +86,7 @@ class EngineTest : public ::testing::Test {
                                          const std::string& field) {
     std::vector<std::string> out;
     Snapshot s = db.OpenSnapshot(sql);
-    while (!s.EOF()) {
+    while (!s.AtEnd()) {
       const Value& v = s.Field(field);
       out.push_back(IsNull(v) ? "<null>" : std::get<std::string>(v));
       s.MoveNext();
@@ -471,8 +466,8 @@ class SnapshotTest : public EngineTest {
 
 TEST_F(SnapshotTest, NavigationAndRecordCountFollowTheDesktopEngine) {
   Snapshot s = db_->OpenSnapshot("SELECT AccountKey FROM tAccount ORDER BY AccountKey");
-  EXPECT_FALSE(s.BOF());
-  EXPECT_FALSE(s.EOF());
+  EXPECT_FALSE(s.AtStart());
+  EXPECT_FALSE(s.AtEnd());
   EXPECT_EQ(s.RecordCount(), 1);
   EXPECT_EQ(std::get<std::string>(s.Field("AccountKey")), "1");
   s.MoveNext();
@@ -481,15 +476,15 @@ TEST_F(SnapshotTest, NavigationAndRecordCountFollowTheDesktopEngine) {
   EXPECT_EQ(s.RecordCount(), 3);
   EXPECT_EQ(std::get<std::string>(s.Field(0)), "3");
   s.MoveNext();
-  EXPECT_TRUE(s.EOF());
+  EXPECT_TRUE(s.AtEnd());
   EXPECT_EQ(ErrorOf([&] { s.Field(0); }), kErrNoCurrentRecord);
   EXPECT_EQ(ErrorOf([&] { s.MoveNext(); }), kErrNoCurrentRecord);
   s.MovePrevious();
   EXPECT_EQ(std::get<std::string>(s.Field(0)), "3");
   s.MoveFirst();
   s.MovePrevious();
-  EXPECT_TRUE(s.BOF());
-  EXPECT_FALSE(s.EOF());
+  EXPECT_TRUE(s.AtStart());
+  EXPECT_FALSE(s.AtEnd());
   EXPECT_EQ(ErrorOf([&] { s.Field("AccountKey"); }), kErrNoCurrentRecord);
   EXPECT_EQ(ErrorOf([&] { s.MovePrevious(); }), kErrNoCurrentRecord);
   EXPECT_EQ(s.RecordCount(), 3);
@@ -497,8 +492,8 @@ TEST_F(SnapshotTest, NavigationAndRecordCountFollowTheDesktopEngine) {
 
 TEST_F(SnapshotTest, EmptyResultIsAtBothEnds) {
   Snapshot s = db_->OpenSnapshot("SELECT AccountKey FROM tAccount WHERE AccountKey = \"9\"");
-  EXPECT_TRUE(s.BOF());
-  EXPECT_TRUE(s.EOF());
+  EXPECT_TRUE(s.AtStart());
+  EXPECT_TRUE(s.AtEnd());
   EXPECT_EQ(s.RecordCount(), 0);
   EXPECT_EQ(ErrorOf([&] { s.MoveFirst(); }), kErrNoCurrentRecord);
   EXPECT_EQ(ErrorOf([&] { s.MoveLast(); }), kErrNoCurrentRecord);
@@ -515,7 +510,7 @@ TEST_F(SnapshotTest, NullFieldsAndBooleansReadBack) {
   EXPECT_EQ(std::get<int64_t>(s.Field("Include")), -1);
   db_->Execute("UPDATE tAccount SET Include = False WHERE AccountKey = \"2\"");
   Snapshot after = db_->OpenSnapshot("SELECT Include FROM tAccount WHERE Include = False");
-  ASSERT_FALSE(after.EOF());
+  ASSERT_FALSE(after.AtEnd());
   EXPECT_EQ(std::get<int64_t>(after.Field(0)), 0);
 }
 

@@ -7,11 +7,8 @@
 #include <string>
 #include <vector>
 
-#include "workdb/jetsql.h"
-#pragma push_macro("EOF")
-#undef EOF
 #include "workdb/engine.h"
-#pragma pop_macro("EOF")
+#include "workdb/jetsql.h"
 
 namespace zdr::db {
 namespace {

@@ -12,9 +12,6 @@
 
 #include "workdb/schema.h"
 
-// Snapshot::EOF() is called below; the C library's macro of that name must not rewrite it.
-#undef EOF
-
 namespace zdr {
 namespace {
 
@@ -196,7 +193,7 @@ TEST_F(SchemaTest, StoredQueryTextIsExact) {
             "tStockLine.CompID, tStockLine.TavFileID, tStockLine.HeadIndx");
   EXPECT_EQ(HeadByItemSql(), work.QuerySql("qHeadByItem"));
   db::Snapshot rows = work.OpenSnapshot("SELECT * FROM qHeadByItem");
-  EXPECT_TRUE(rows.EOF());
+  EXPECT_TRUE(rows.AtEnd());
 }
 
 TEST_F(SchemaTest, LinkOnlyWhenTheSelectionDbPathIsSet) {
@@ -210,7 +207,7 @@ TEST_F(SchemaTest, LinkOnlyWhenTheSelectionDbPathIsSet) {
     db::Database work = db::Database::Open(CreateWorkDB(select, ui_));
     EXPECT_TRUE(work.HasTable("tSelectAccount"));
     db::Snapshot rows = work.OpenSnapshot("SELECT SortByKey FROM tSelectAccount");
-    EXPECT_TRUE(rows.EOF());
+    EXPECT_TRUE(rows.AtEnd());
   }
   EXPECT_TRUE(ui_.shown.empty());
 }
@@ -260,7 +257,7 @@ TEST_F(SchemaTest, RecreationEmptiesTheTables) {
   ASSERT_EQ(CreateSelectDB(ui_), path);
   db::Database select = db::Database::Open(path);
   db::Snapshot rows = select.OpenSnapshot("SELECT * FROM tSelectAccount");
-  EXPECT_TRUE(rows.EOF());
+  EXPECT_TRUE(rows.AtEnd());
 }
 
 // ---------------------------------------------------------------------------------------

@@ -13,9 +13,6 @@
 
 #include "workdb/schema.h"
 
-// Snapshot::EOF() is called below; the C library's macro of that name must not rewrite it.
-#undef EOF
-
 namespace zdr {
 namespace {
 
@@ -66,7 +63,7 @@ std::vector<std::string> Column(db::Database& d, const std::string& jet, const c
   std::vector<std::string> out;
   db::Snapshot rs = d.OpenSnapshot(jet);
   const int f = rs.FieldIndex(field);
-  while (!rs.EOF()) {
+  while (!rs.AtEnd()) {
     out.push_back(AsText(rs.Field(f)));
     rs.MoveNext();
   }
@@ -272,7 +269,7 @@ TEST_F(StatementTest, ResultColumnsAreNamedAsTheOutputsReadThem) {
   }
   db::Snapshot rs = work_->OpenSnapshot(std::string(kAccountColumns) + " FROM tAccount" + kWhere +
                                         " AND tAccount.AccountKey = '100'" + kByKey);
-  ASSERT_FALSE(rs.EOF());
+  ASSERT_FALSE(rs.AtEnd());
   EXPECT_EQ(rs.Field("Reference1"), Value(int64_t{1000}));
   EXPECT_EQ(rs.Field("DetailsLine1"), Value(std::string("0")));
   EXPECT_EQ(rs.Field("SortByKeyVal"), Value(100.0));
