@@ -37,36 +37,36 @@ void Control::ReadAllData(bool pAsIs) {
   zdr::ReadAllData(pAsIs, panel_, state_, docTypes_, ui_);
 }
 
-std::string Control::CmdLabPrev() {
+// The label sheet and the address list: the data load as-is, then the page in the temporary
+// folder, opened in a new browser window.
+template <typename WritePage>
+static std::string RunPageCommand(Control& control, const char* fileName, WritePage writePage) {
+  UserSeam& ui = control.ui();
   try {
-    ReadAllData(true);
-    ui_.YieldToEvents();
-    ui_.SetStatus("מכין רשימה");
-    const std::string path = TempFile("zdrlab1.htm");
-    CreateLabFile(path, state_.workDbPath, panel_, docTypes_, state_.selectDbPath, labels_, ui_);
-    OpenPage(ui_, path);
-    ui_.SetStatus("הכנת הרשימה הסתיימה");
+    control.ReadAllData(true);
+    ui.YieldToEvents();
+    ui.SetStatus("מכין רשימה");
+    const std::string path = TempFile(fileName);
+    writePage(path);
+    OpenPage(ui, path);
+    ui.SetStatus("הכנת הרשימה הסתיימה");
     return path;
   } catch (const std::exception& e) {
-    ui_.ShowMessage(e.what(), kTitleFault, MsgIcon::Critical);
+    ui.ShowMessage(e.what(), kTitleFault, MsgIcon::Critical);
     return "";
   }
 }
 
+std::string Control::CmdLabPrev() {
+  return RunPageCommand(*this, "zdrlab1.htm", [this](const std::string& path) {
+    CreateLabFile(path, state_.workDbPath, panel_, docTypes_, state_.selectDbPath, labels_, ui_);
+  });
+}
+
 std::string Control::CmdPreview() {
-  try {
-    ReadAllData(true);
-    ui_.YieldToEvents();
-    ui_.SetStatus("מכין רשימה");
-    const std::string path = TempFile("zdrlab2.htm");
+  return RunPageCommand(*this, "zdrlab2.htm", [this](const std::string& path) {
     CreateHTML(path, state_.workDbPath, panel_, docTypes_, state_.selectDbPath, ui_);
-    OpenPage(ui_, path);
-    ui_.SetStatus("הכנת הרשימה הסתיימה");
-    return path;
-  } catch (const std::exception& e) {
-    ui_.ShowMessage(e.what(), kTitleFault, MsgIcon::Critical);
-    return "";
-  }
+  });
 }
 
 std::string Control::CmdBuildPostIL() {
