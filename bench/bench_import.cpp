@@ -7,8 +7,10 @@
 // Every importer runs with all its criteria on, set wide so that nearly every record passes.
 //
 // The floor of an importer (BM_Floor.../0) reads every record of the same files and appends the
-// very rows the importer wrote to plain SQLite tables of the same columns and unique indexes.
-// BM_Floor.../1 appends them through the engine instead, into a fresh working database.
+// very rows the importer wrote through bare SQLite, into tables made by the engine's own table
+// and index statements (same Hebrew collation, constraints and indexes) under the working
+// database's pragmas. BM_Floor.../1 appends them through the engine instead, into a fresh
+// working database.
 //
 // Counters: records/s (host records read), rows (rows written), peak_rss_mb (peak resident
 // memory during the run, reset before each benchmark).
@@ -34,6 +36,7 @@
 #include "import/doctypes.h"
 #include "import/hostfile.h"
 #include "import/importers.h"
+#include "workdb/collation.h"
 #include "workdb/engine.h"
 #include "workdb/schema.h"
 #include "zdrgen/generator.h"
@@ -284,6 +287,7 @@ uint64_t ReadBytes(const fs::path& file, size_t len) {
 // The rows an importer wrote, with its tables' definitions, captured once.
 struct CapturedTable {
   db::TableDef def{""};
+  std::vector<std::string> ddl;  // the table's statement, then its indexes'
   std::vector<std::vector<db::Value>> rows;
 };
 struct Captured {
@@ -305,6 +309,16 @@ Captured Capture(const std::vector<std::string>& tables,
   for (const auto& name : tables) {
     CapturedTable t;
     t.def = db.Describe(name);
+    sqlite3_stmt* st = nullptr;
+    sqlite3_prepare_v2(db.Handle(),
+                       "SELECT sql FROM sqlite_master WHERE tbl_name = ?1 AND sql IS NOT NULL"
+                       " ORDER BY type DESC",
+                       -1, &st, nullptr);
+    sqlite3_bind_text(st, 1, name.c_str(), -1, SQLITE_STATIC);
+    while (sqlite3_step(st) == SQLITE_ROW) {
+      t.ddl.emplace_back(reinterpret_cast<const char*>(sqlite3_column_text(st, 0)));
+    }
+    sqlite3_finalize(st);
     db::Snapshot s = db.OpenSnapshot("SELECT * FROM " + name);
     while (!s.AtEnd()) {
       std::vector<db::Value> row;
@@ -317,37 +331,27 @@ Captured Capture(const std::vector<std::string>& tables,
   return c;
 }
 
-// Appends the captured rows to tables of the same columns and unique indexes (plain SQLite:
-// binary collation, no checks), through one prepared statement per table, in one transaction.
+// Appends the captured rows through bare SQLite to tables made by the engine's own statements
+// (Hebrew collation, checks, keys), through one prepared statement per table, in one
+// transaction, under the working database's pragmas.
 void BareAppends(const Captured& captured) {
   fs::path path = BenchRoot() / "temp" / "floor.db";
   fs::remove(path);
   sqlite3* db = nullptr;
   sqlite3_open(path.c_str(), &db);
-  sqlite3_exec(db, "PRAGMA journal_mode=OFF; PRAGMA synchronous=OFF; BEGIN", nullptr, nullptr,
-               nullptr);
+  db::RegisterHebrewCollation(db);
+  sqlite3_exec(db,
+               "PRAGMA journal_mode=OFF; PRAGMA synchronous=OFF; PRAGMA temp_store=MEMORY;"
+               " PRAGMA cache_size=-65536; BEGIN",
+               nullptr, nullptr, nullptr);
   for (const CapturedTable& t : captured.tables) {
-    std::string create = "CREATE TABLE " + t.def.name + "(";
-    std::string insert = "INSERT INTO " + t.def.name + " VALUES(";
-    for (size_t i = 0; i < t.def.fields.size(); ++i) {
-      const db::FieldDef& f = t.def.fields[i];
-      create += (i ? ", " : "") + f.name +
-                (f.type == db::FieldType::Text     ? " TEXT"
-                 : f.type == db::FieldType::Double ? " REAL"
-                 : f.type == db::FieldType::Date   ? " REAL"
-                                                   : " INTEGER");
-      insert += i ? ",?" : "?";
-    }
-    create += ")";
+    std::string insert = "INSERT INTO \"" + t.def.name + "\" VALUES(";
+    for (size_t i = 0; i < t.def.fields.size(); ++i) insert += i ? ",?" : "?";
     insert += ")";
-    sqlite3_exec(db, create.c_str(), nullptr, nullptr, nullptr);
-    for (const db::IndexDef& ix : t.def.indexes) {
-      if (!ix.unique) continue;
-      std::string sql =
-          "CREATE UNIQUE INDEX " + t.def.name + "_" + ix.name + " ON " + t.def.name + "(";
-      for (size_t i = 0; i < ix.fields.size(); ++i) sql += (i ? ", " : "") + ix.fields[i];
-      sql += ")";
-      sqlite3_exec(db, sql.c_str(), nullptr, nullptr, nullptr);
+    for (const std::string& sql : t.ddl) {
+      if (sqlite3_exec(db, sql.c_str(), nullptr, nullptr, nullptr) != SQLITE_OK) {
+        std::fprintf(stderr, "floor: %s\n", sqlite3_errmsg(db));
+      }
     }
     sqlite3_stmt* st = nullptr;
     sqlite3_prepare_v2(db, insert.c_str(), -1, &st, nullptr);
@@ -364,7 +368,9 @@ void BareAppends(const Captured& captured) {
           sqlite3_bind_null(st, col);
         }
       }
-      sqlite3_step(st);
+      if (sqlite3_step(st) != SQLITE_DONE) {
+        std::fprintf(stderr, "floor: %s\n", sqlite3_errmsg(db));
+      }
       sqlite3_reset(st);
     }
     sqlite3_finalize(st);
