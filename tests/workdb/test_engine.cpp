@@ -550,6 +550,59 @@ TEST_F(SnapshotTest, ExecuteReturnsRowsChangedAndKeepsFieldRules) {
             (std::vector<std::string>{"1", "2", "3"}));
 }
 
+TEST_F(SnapshotTest, ExecutedInsertsKeepFieldRulesToo) {
+  db_->CreateTable(NumbersDef());
+  EXPECT_EQ(ErrorOf([&] {
+              db_->Execute("INSERT INTO tAccount (AccountKey, City) VALUES (\"9\", \"\")");
+            }),
+            kErrZeroLength);
+  EXPECT_EQ(
+      ErrorOf([&] {
+        db_->Execute("INSERT INTO tAccount (AccountKey, CategoryCode) VALUES (\"9\", \"abcd\")");
+      }),
+      kErrFieldTooSmall);
+  EXPECT_EQ(ErrorOf([&] { db_->Execute("INSERT INTO tNumbers (B) VALUES (256)"); }),
+            kErrNumericOverflow);
+  EXPECT_EQ(ErrorOf([&] { db_->Execute("INSERT INTO tNumbers (I) VALUES (-32769)"); }),
+            kErrNumericOverflow);
+  EXPECT_EQ(db_->Execute("INSERT INTO tNumbers (B, I, Code) VALUES (255, -32768, \"abc\")"), 1);
+  EXPECT_EQ(Count(*db_, "tAccount"), 3);
+  EXPECT_EQ(Count(*db_, "tNumbers"), 1);
+}
+
+TEST_F(SnapshotTest, FieldRulesHoldOnBothPathsWhileARecordsetIsOpen) {
+  TableRecordset rs = db_->OpenTable("tAccount");
+  EXPECT_EQ(AddAccount(rs, "4", "דלת"), 0);
+  EXPECT_EQ(ErrorOf([&] { db_->Execute("UPDATE tAccount SET City = \"\""); }), kErrZeroLength);
+  EXPECT_EQ(db_->Execute("UPDATE tAccount SET City = \"עכו\" WHERE AccountKey = \"4\""), 1);
+  // Appends after the statements still refuse what they refused before.
+  EXPECT_EQ(AddAccount(rs, "5", "הא"), 0);
+  EXPECT_EQ(AddAccount(rs, "6", ""), kErrZeroLength);
+  EXPECT_EQ(AddAccount(rs, "7", "ו", "123456789012345678901"), kErrFieldTooSmall);
+  EXPECT_EQ(ErrorOf([&] { db_->Execute("UPDATE tAccount SET CategoryCode = \"אבגד\""); }),
+            kErrFieldTooSmall);
+  rs.Close();
+  EXPECT_EQ(Column(*db_, "SELECT City FROM tAccount WHERE AccountKey = \"4\"", "City"),
+            (std::vector<std::string>{"עכו"}));
+  EXPECT_EQ(Count(*db_, "tAccount"), 5);
+}
+
+TEST_F(SnapshotTest, WritingStatementOpenedAsSnapshotKeepsFieldRules) {
+  EXPECT_EQ(ErrorOf([&] { db_->OpenSnapshot("UPDATE tAccount SET City = \"\""); }), kErrZeroLength);
+  EXPECT_EQ(Count(*db_, "tAccount"), 3);
+}
+
+TEST_F(SnapshotTest, TheFileKeepsItsFieldRulesForOtherPrograms) {
+  db_->Close();
+  sqlite3* raw = nullptr;
+  ASSERT_EQ(sqlite3_open(File("s.DB").c_str(), &raw), SQLITE_OK);
+  RegisterHebrewCollation(raw);
+  EXPECT_EQ(sqlite3_exec(raw, "UPDATE tAccount SET City = ''", nullptr, nullptr, nullptr),
+            SQLITE_CONSTRAINT);
+  EXPECT_EQ(sqlite3_extended_errcode(raw), SQLITE_CONSTRAINT_CHECK);
+  sqlite3_close(raw);
+}
+
 // ---------------------------------------------------------------------------------------
 // Links and stored queries
 
