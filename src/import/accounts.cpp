@@ -126,7 +126,7 @@ bool AccountCriteria::Pass(std::string_view rec, std::string& keyBuf) const {
     if (hasToAgent && agent > toAgent) return false;
   }
   if (useKey) {
-    keyBuf = ConvertForSort(FieldOf(rec, kKeyAt, kKeyLen));
+    ConvertForSort(FieldOf(rec, kKeyAt, kKeyLen), keyBuf);
     std::string_view k = TrimSpaces(keyBuf);
     if (boundsNumeric && importing::IsNumericText(k)) {
       double v = importing::NumberAtStart(k);
@@ -178,41 +178,47 @@ class AccountWriter {
 
   void Write(std::string_view rec) {
     std::string_view keyField = FieldOf(rec, kKeyAt, kKeyLen);
-    std::string displayKey = ConvertForDisplay(keyField, asIs_);
-    std::string_view key = TrimSpaces(displayKey);
+    ConvertForDisplay(keyField, asIs_, displayKey_);
+    std::string_view key = TrimSpaces(displayKey_);
     // A blank key cannot be stored; such a record is passed over like a deleted one instead of
     // ending the import and losing every account after it.
     if (key.empty()) return;
 
-    std::string name = ConvertWithBidi(FieldOf(rec, kNameAt, kNameLen));
-    std::string sortKey = ConvertSpaced(TrimSpaces(keyField));
+    ConvertWithBidi(FieldOf(rec, kNameAt, kNameLen), nameText_);
+    ConvertSpaced(TrimSpaces(keyField), sortKey_);
 
     rs_.AddNew();
     key_.Set(rs_, key);
     if (allDetails_) {
       std::string_view city = FieldOf(rec, kCityAt, kCityLen);
       std::string_view zip = FieldOf(rec, kZipAt, kZipLen);
-      name_->SetOr(rs_, name, ".");
+      name_->SetOr(rs_, nameText_, ".");
       category_->Set(rs_, FieldOf(rec, kSortAt, kSortLen));
-      cutOff_->Set(rs_, ReverseAndMirror(FieldOf(rec, kCutOffAt, kCutOffLen)));
-      address_->SetOr(rs_, ConvertWithBidi(FieldOf(rec, kAddressAt, kAddressLen)), " ");
-      city_->SetOr(rs_, ConvertWithBidi(city), " ");
-      zip_->SetOr(rs_, ConvertWithBidi(zip), " ");
-      district_->SetOr(rs_, ConvertWithBidi(FieldOf(rec, kDistrictAt, kDistrictLen)), " ");
-      details_->SetOr(rs_,
-                      ConvertWithBidi(ExtractHebrewWords(
-                          TrimSpaces(FieldOf(rec, kDetailsAt, kDetailsLen)), 20)),
-                      " ");
-      std::string phone = ConvertSpaced(FieldOf(rec, kPhoneAt, kPhoneLen));
-      phone_->SetOr(rs_, TrimSpaces(phone), " ");
-      sortByCity_->SetOr(rs_, ConvertForSort(TrimSpaces(city)), " ");
-      sortByZip_->SetOr(rs_, ConvertForSort(TrimSpaces(zip)), " ");
+      ReverseAndMirror(FieldOf(rec, kCutOffAt, kCutOffLen), scratch_);
+      cutOff_->Set(rs_, scratch_);
+      ConvertWithBidi(FieldOf(rec, kAddressAt, kAddressLen), scratch_);
+      address_->SetOr(rs_, scratch_, " ");
+      ConvertWithBidi(city, scratch_);
+      city_->SetOr(rs_, scratch_, " ");
+      ConvertWithBidi(zip, scratch_);
+      zip_->SetOr(rs_, scratch_, " ");
+      ConvertWithBidi(FieldOf(rec, kDistrictAt, kDistrictLen), scratch_);
+      district_->SetOr(rs_, scratch_, " ");
+      ConvertWithBidi(ExtractHebrewWords(TrimSpaces(FieldOf(rec, kDetailsAt, kDetailsLen)), 20),
+                      scratch_);
+      details_->SetOr(rs_, scratch_, " ");
+      ConvertSpaced(FieldOf(rec, kPhoneAt, kPhoneLen), scratch_);
+      phone_->SetOr(rs_, TrimSpaces(scratch_), " ");
+      ConvertForSort(TrimSpaces(city), scratch_);
+      sortByCity_->SetOr(rs_, scratch_, " ");
+      ConvertForSort(TrimSpaces(zip), scratch_);
+      sortByZip_->SetOr(rs_, scratch_, " ");
     }
-    sortByKey_.SetOr(rs_, sortKey, " ");
+    sortByKey_.SetOr(rs_, sortKey_, " ");
     if (allDetails_) {
-      rs_.SetDouble(sortByKeyVal_, importing::NumberAtStart(sortKey));
+      rs_.SetDouble(sortByKeyVal_, importing::NumberAtStart(sortKey_));
     }
-    sortByName_.SetOr(rs_, name, " ");
+    sortByName_.SetOr(rs_, nameText_, " ");
     rs_.SetBool(include_, true);
     importing::UpdatePassingDuplicates(rs_);
   }
@@ -225,6 +231,8 @@ class AccountWriter {
   std::optional<TextColumn> name_, category_, cutOff_, address_, city_, zip_, district_, details_,
       phone_, sortByCity_, sortByZip_;
   int sortByKeyVal_ = -1;
+  // Conversion buffers reused from record to record (each column copies what it is given).
+  std::string displayKey_, nameText_, sortKey_, scratch_;
 };
 
 }  // namespace

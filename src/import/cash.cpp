@@ -43,13 +43,14 @@ int16_t ReadCash(const std::string& CompPath, const std::string& pDBFile, const 
     db::TableRecordset rs = db.OpenTable("tCash");
     const int transId = rs.FieldIndex("TransID");
     importing::TextColumn account(rs, "AccountKey");
+    std::string key;  // reused from record to record
 
     for (int64_t i = 1; i <= n; ++i) {
       std::string_view rec = importing::RecordOf(file, i);
       const Date date = importing::DateAt(rec, kDateAt);
       if (!(from && date < *from) && !(to && date > *to)) {
         // Keys match tAccount's: converted as the account import of this load converts them.
-        std::string key = ConvertForDisplay(FieldOf(rec, kKeyAt, kKeyLen), pAsIs);
+        ConvertForDisplay(FieldOf(rec, kKeyAt, kKeyLen), pAsIs, key);
         std::string_view trimmed = TrimSpaces(key);
         if (!trimmed.empty()) {
           rs.AddNew();

@@ -48,12 +48,11 @@ struct TwoEnded {
   }
   void PutInFront(char c) { front.push_back(c); }
   void Append(char c) { back.push_back(c); }
-  std::string Take() const {
-    std::string out;
+  void TakeInto(std::string& out) const {
+    out.clear();
     out.reserve(front.size() + back.size());
     out.append(front.rbegin(), front.rend());
     out += back;
-    return out;
   }
 };
 
@@ -84,8 +83,9 @@ class InverseBidi {
   InverseBidi(const InverseBidi&) = delete;
   InverseBidi& operator=(const InverseBidi&) = delete;
 
-  // Windows-1255 in display order to Windows-1255 in reading order, same length.
-  std::string Reorder(std::string_view s) {
+  // Windows-1255 in display order to Windows-1255 in reading order, same length, into
+  // `result`.
+  void Reorder(std::string_view s, std::string& result) {
     if (bidi_ == nullptr) throw HostTextError("סידור הטקסט הדו-כיווני נכשל (ICU)");
     in_.resize(s.size());
     for (size_t i = 0; i < s.size(); ++i) {
@@ -106,7 +106,6 @@ class InverseBidi {
     if (U_FAILURE(err)) {
       throw HostTextError(std::string("סידור הטקסט הדו-כיווני נכשל: ") + u_errorName(err));
     }
-    std::string result;
     result.resize(static_cast<size_t>(n));
     for (int32_t i = 0; i < n; ++i) {
       const int b = CodePointToWin1255(out_[static_cast<size_t>(i)]);
@@ -114,7 +113,6 @@ class InverseBidi {
       // adds none of its own, so the byte always exists.
       result[static_cast<size_t>(i)] = b >= 0 ? static_cast<char>(b) : '?';
     }
-    return result;
   }
 
  private:
@@ -139,13 +137,20 @@ bool ReadsAsStored(std::string_view t) {
   return IsAsciiLetter(Byte(t.front())) && IsAsciiLetter(Byte(t.back()));
 }
 
+// ICU's reordering into `out`; one reordering state per thread.
+void ReorderWithIcu(std::string_view s, std::string& out) {
+  thread_local InverseBidi bidi;
+  bidi.Reorder(s, out);
+}
+
 }  // namespace
 
 namespace detail {
 
 std::string BidiReorderWithIcu(std::string_view s) {
-  thread_local InverseBidi bidi;
-  return bidi.Reorder(s);
+  std::string out;
+  ReorderWithIcu(s, out);
+  return out;
 }
 
 }  // namespace detail
@@ -236,16 +241,22 @@ char ConvertChar(char c) {
   return IsHostHebrew(b) ? MapHebrew(b) : c;
 }
 
+void ReverseAndMirror(std::string_view s, std::string& out) {
+  out.resize(s.size());
+  char* o = out.data();
+  for (auto it = s.rbegin(); it != s.rend(); ++it) *o++ = ConvertChar(*it);
+}
+
 std::string ReverseAndMirror(std::string_view s) {
   std::string out;
-  out.reserve(s.size());
-  for (auto it = s.rbegin(); it != s.rend(); ++it) out.push_back(ConvertChar(*it));
+  ReverseAndMirror(s, out);
   return out;
 }
 
-std::string ReorderHebrewFirst(std::string_view s) {
-  std::string hebrew;
-  std::string restReversed;
+void ReorderHebrewFirst(std::string_view s, std::string& hebrew) {
+  thread_local std::string restReversed;
+  hebrew.clear();
+  restReversed.clear();
   hebrew.reserve(s.size());
   restReversed.reserve(s.size());
   bool inHebrew = false;
@@ -278,15 +289,30 @@ std::string ReorderHebrewFirst(std::string_view s) {
     }
   }
   hebrew.append(restReversed.rbegin(), restReversed.rend());
-  return hebrew;
+}
+
+std::string ReorderHebrewFirst(std::string_view s) {
+  std::string out;
+  ReorderHebrewFirst(s, out);
+  return out;
+}
+
+void ConvertForDisplay(std::string_view s, bool asIs, std::string& out) {
+  const std::string_view t = TrimSpaces(s);
+  if (asIs) {
+    ReverseAndMirror(t, out);
+  } else {
+    ReorderHebrewFirst(t, out);
+  }
 }
 
 std::string ConvertForDisplay(std::string_view s, bool asIs) {
-  const std::string_view t = TrimSpaces(s);
-  return asIs ? ReverseAndMirror(t) : ReorderHebrewFirst(t);
+  std::string out;
+  ConvertForDisplay(s, asIs, out);
+  return out;
 }
 
-std::string ConvertForSort(std::string_view s) {
+void ConvertForSort(std::string_view s, std::string& out) {
   TwoEnded& res = TwoEnded::Scratch();
   bool inHebrew = false;
   bool seenLatin = false;
@@ -307,10 +333,16 @@ std::string ConvertForSort(std::string_view s) {
       res.Append(c);
     }
   }
-  return res.Take();
+  res.TakeInto(out);
 }
 
-std::string ConvertSpaced(std::string_view s) {
+std::string ConvertForSort(std::string_view s) {
+  std::string out;
+  ConvertForSort(s, out);
+  return out;
+}
+
+void ConvertSpaced(std::string_view s, std::string& out) {
   TwoEnded& res = TwoEnded::Scratch();
   bool inHebrew = false;
   bool seenLatin = false;
@@ -333,30 +365,53 @@ std::string ConvertSpaced(std::string_view s) {
       res.Append(' ');
     }
   }
-  return res.Take();
+  res.TakeInto(out);
 }
 
-std::string ConvertWithBidi(std::string_view s) {
+std::string ConvertSpaced(std::string_view s) {
+  std::string out;
+  ConvertSpaced(s, out);
+  return out;
+}
+
+void ConvertWithBidi(std::string_view s, std::string& out) {
   const std::string_view t = TrimSpaces(s);
-  if (t.empty()) return {};
+  if (t.empty()) {
+    out.clear();
+    return;
+  }
   thread_local std::string mirrored;
   mirrored.assign(t);
   for (char& c : mirrored) c = ConvertChar(c);
-  return BidiReorder(mirrored);
+  BidiReorder(mirrored, out);
 }
 
-std::string BidiReorder(std::string_view s) {
+std::string ConvertWithBidi(std::string_view s) {
+  std::string out;
+  ConvertWithBidi(s, out);
+  return out;
+}
+
+void BidiReorder(std::string_view s, std::string& reordered) {
   // The field ends at its first zero byte; reordering past it would carry the padding
   // into the middle of the line.
   const std::string_view t = TrimSpaces(CutAtNull(s));
-  if (ReadsAsStored(t)) return std::string(t);
-  std::string reordered = detail::BidiReorderWithIcu(t);
+  if (ReadsAsStored(t)) {
+    reordered.assign(t);
+    return;
+  }
+  ReorderWithIcu(t, reordered);
   const std::string_view kept = TrimSpaces(CutAtNull(reordered));
   if (kept.size() != reordered.size()) {
     const size_t from = static_cast<size_t>(kept.data() - reordered.data());
     reordered.erase(from + kept.size()).erase(0, from);
   }
-  return reordered;
+}
+
+std::string BidiReorder(std::string_view s) {
+  std::string out;
+  BidiReorder(s, out);
+  return out;
 }
 
 std::string_view CutAtNull(std::string_view s) {

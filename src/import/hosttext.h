@@ -82,6 +82,18 @@ std::string ExtractHebrewWords(std::string_view s, int16_t n);
 // spaces. Throws HostTextError when `v` is longer than `n` or `n` is negative.
 std::string AlignRight(const std::optional<std::string_view>& v, int16_t n);
 
+// Forms of the conversions above for loops that convert every record: the result replaces
+// the contents of `out`, whose capacity is kept from call to call, so a warm buffer converts
+// without allocating. The results are those of the returning forms, byte for byte. `out` must
+// not share storage with `s`.
+void ReverseAndMirror(std::string_view s, std::string& out);
+void ReorderHebrewFirst(std::string_view s, std::string& out);
+void ConvertForDisplay(std::string_view s, bool asIs, std::string& out);
+void ConvertForSort(std::string_view s, std::string& out);
+void ConvertSpaced(std::string_view s, std::string& out);
+void ConvertWithBidi(std::string_view s, std::string& out);
+void BidiReorder(std::string_view s, std::string& out);
+
 // The integer value of a text as the host's routines read it: surrounding spaces ignored,
 // a fractional number rounded (halves to even); throws HostTextError when not a number.
 int64_t HostIntValue(std::string_view s);

@@ -144,8 +144,9 @@ void TextColumn::Set(db::TableRecordset& rs, std::string_view win1255) {
 
 LedgerFilter::LedgerFilter(const Panel& panel) {
   if (Panel::On(panel.chkTransType) && !panel.txtTransType.empty()) {
-    hasPattern_ = true;
     pattern_ = panel.txtTransType;
+    // A pattern of stars alone matches every type: no need to convert each one to test it.
+    hasPattern_ = pattern_.find_first_not_of('*') != std::string::npos;
   }
   auto date = [](int box, const std::string& text) -> std::optional<Date> {
     if (!Panel::On(box) || text.empty()) return std::nullopt;
@@ -159,9 +160,9 @@ LedgerFilter::LedgerFilter(const Panel& panel) {
 
 bool LedgerFilter::Pass(std::string_view typeField, Date date, Date valueDate) {
   if (hasPattern_) {
-    std::string spaced = ConvertSpaced(TrimSpaces(typeField));
+    ConvertSpaced(TrimSpaces(typeField), spaced_);
     typeUtf8_.clear();
-    AppendWin1255AsUtf8(spaced, typeUtf8_);
+    AppendWin1255AsUtf8(spaced_, typeUtf8_);
     // The spaced conversion ends a type of Latin letters or digits with a space; a pattern
     // typed as the type reads on screen ("AB", "#") must still match it.
     if (!db::JetLike(pattern_, typeUtf8_, true) &&
@@ -199,9 +200,18 @@ TransactWriter::TransactWriter(db::TableRecordset& rs, bool asIs)
 
 void TransactWriter::Add(int32_t fileId, int32_t transId, std::string_view keyField) {
   // As-is, this is the key reversed with its brackets mirrored, trimmed.
-  std::string key = ConvertForDisplay(keyField, asIs_);
-  std::string_view trimmed = TrimSpaces(key);
+  ConvertForDisplay(keyField, asIs_, converted_);
+  std::string_view trimmed = TrimSpaces(converted_);
   if (trimmed.empty()) return;
+  if (fileId != lastFileId_ || transId != lastTransId_) {
+    lastFileId_ = fileId;
+    lastTransId_ = transId;
+    offered_ = 0;
+  }
+  for (size_t k = 0; k < offered_; ++k) {
+    if (offeredKeys_[k] == trimmed) return;
+  }
+  if (offered_ < kKeysPerTransaction) offeredKeys_[offered_++].assign(trimmed);
   rs_.AddNew();
   rs_.SetInt(fileId_, fileId);
   rs_.SetInt(transId_, transId);

@@ -99,7 +99,7 @@ class LedgerFilter {
   bool hasPattern_ = false;
   std::string pattern_;  // UTF-8, as typed
   std::optional<Date> from_, to_, valueFrom_, valueTo_;
-  std::string typeUtf8_;
+  std::string spaced_, typeUtf8_;  // reused from record to record
 };
 
 // The journal range of the panel; a bound is in force when ChkJournal is on and its text is
@@ -121,10 +121,19 @@ class TransactWriter {
   void Add(int32_t fileId, int32_t transId, std::string_view keyField);
 
  private:
+  static constexpr size_t kKeysPerTransaction = 4;
+
   db::TableRecordset& rs_;
   int fileId_, transId_;
   TextColumn key_;
   bool asIs_;
+  std::string converted_;
+  // The keys already offered for the transaction of the last call: a key repeated within one
+  // transaction is a duplicate row for certain, and is passed over without asking the table
+  // (whose refusal costs far more than the comparison).
+  int32_t lastFileId_ = 0, lastTransId_ = 0;
+  size_t offered_ = 0;
+  std::string offeredKeys_[kKeysPerTransaction];
 };
 
 }  // namespace zdr::importing

@@ -86,8 +86,8 @@ class HeadWriter {
     rs_.SetDate(dueDate_, dueDate);
     rs_.SetInt(reference_, reference);
 
-    std::string account = ConvertForDisplay(FieldOf(head, kAccountAt, kAccountLen), asIs_);
-    account_.SetOr(rs_, TrimSpaces(account), "-");
+    ConvertForDisplay(FieldOf(head, kAccountAt, kAccountLen), asIs_, scratch_);
+    account_.SetOr(rs_, TrimSpaces(scratch_), "-");
 
     std::string_view name = TrimSpaces(FieldOf(head, kNameAt, kNameLen));
     std::string_view address1 = TrimSpaces(FieldOf(head, kAddress1At, kAddressLen));
@@ -95,12 +95,27 @@ class HeadWriter {
     std::string_view details = TrimSpaces(FieldOf(head, kDetailsAt, kDetailsLen));
     // A field that converts to nothing (quotes or brackets only) stays Null: the table refuses
     // an empty text, and refusing it would end the whole import.
-    if (!name.empty()) name_.SetOrNull(rs_, ConvertForDisplay(name, asIs_));
-    if (!address1.empty()) address1_.SetOrNull(rs_, ConvertForDisplay(address1, asIs_));
-    if (!address2.empty()) address2_.SetOrNull(rs_, ConvertForDisplay(address2, asIs_));
-    if (!details.empty()) details_.SetOrNull(rs_, ConvertForDisplay(details, false));
-    if (!name.empty()) sortByName_.SetOrNull(rs_, ConvertForSort(name));
-    if (!address2.empty()) sortByCity_.SetOrNull(rs_, ConvertForDisplay(address2, asIs_));
+    if (!name.empty()) {
+      ConvertForDisplay(name, asIs_, scratch_);
+      name_.SetOrNull(rs_, scratch_);
+    }
+    if (!address1.empty()) {
+      ConvertForDisplay(address1, asIs_, scratch_);
+      address1_.SetOrNull(rs_, scratch_);
+    }
+    if (!address2.empty()) {
+      ConvertForDisplay(address2, asIs_, scratch_);
+      address2_.SetOrNull(rs_, scratch_);
+      sortByCity_.SetOrNull(rs_, scratch_);
+    }
+    if (!details.empty()) {
+      ConvertForDisplay(details, false, scratch_);
+      details_.SetOrNull(rs_, scratch_);
+    }
+    if (!name.empty()) {
+      ConvertForSort(name, scratch_);
+      sortByName_.SetOrNull(rs_, scratch_);
+    }
     sortByZip_.SetOrNull(rs_, address2.substr(0, 5));
     rs_.SetBool(include_, true);
     rs_.Update();
@@ -111,6 +126,7 @@ class HeadWriter {
   bool asIs_;
   int compId_, fileId_, headIndx_, docType_, refDate_, dueDate_, reference_, include_;
   TextColumn account_, name_, address1_, address2_, details_, sortByName_, sortByCity_, sortByZip_;
+  std::string scratch_;  // conversions, reused (each column copies what it is given)
 };
 
 class LineWriter {
@@ -125,13 +141,13 @@ class LineWriter {
 
   void Write(int16_t compId, int16_t fileIndex, int32_t headIndx, int32_t lineIndx,
              std::string_view rawItem) {
-    std::string converted = ConvertForSort(rawItem);
+    ConvertForSort(rawItem, converted_);
     rs_.AddNew();
     rs_.SetInt(compId_, compId);
     rs_.SetInt(fileId_, fileIndex);
     rs_.SetInt(headIndx_, headIndx);
     rs_.SetInt(lineIndx_, lineIndx);
-    item_.Set(rs_, TrimSpaces(converted));
+    item_.Set(rs_, TrimSpaces(converted_));
     rs_.Update();
   }
 
@@ -139,6 +155,7 @@ class LineWriter {
   db::TableRecordset& rs_;
   int compId_, fileId_, headIndx_, lineIndx_;
   TextColumn item_;
+  std::string converted_;
 };
 
 }  // namespace

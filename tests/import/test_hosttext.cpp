@@ -11,6 +11,8 @@
 namespace zdr {
 namespace {
 
+using namespace std::string_literals;
+
 // Windows-1255 bytes of UTF-8 text.
 std::string W(std::string_view utf8) {
   return Utf8ToWin1255(utf8);
@@ -343,6 +345,49 @@ TEST(ConvertWithBidi, FieldOfSpacesGivesEmptyText) {
 }
 
 // ---- Small helpers --------------------------------------------------------------------
+
+// The buffer-taking forms, fed a buffer that still holds a longer earlier result, must give
+// the returning forms' bytes: leftovers of the previous record would corrupt the next one.
+TEST(ReusedBuffers, GiveTheSameBytesAsTheReturningForms) {
+  std::mt19937 rng(862);
+  // Host fields: Hebrew letters, Latin, digits, spaces, quotes, brackets, punctuation, zeros,
+  // bytes above the letters.
+  const std::string bytes = Host("אבגדהוזחטיכלמנסעפצקרשת") + "AbZz0189 \"'()[]{}<>-./,\0\x9b\xff"s;
+  std::string reverse, reorder, displayAsIs, display, sort, spaced, bidi, reorderBidi;
+  for (int i = 0; i < 20000; ++i) {
+    std::string field;
+    for (size_t n = rng() % 32; n > 0; --n) field += bytes[rng() % bytes.size()];
+    if (rng() % 8 == 0) field = std::string(rng() % 5, ' ') + field + std::string(rng() % 5, ' ');
+    ReverseAndMirror(field, reverse);
+    ASSERT_EQ(reverse, ReverseAndMirror(field));
+    ReorderHebrewFirst(field, reorder);
+    ASSERT_EQ(reorder, ReorderHebrewFirst(field));
+    ConvertForDisplay(field, true, displayAsIs);
+    ASSERT_EQ(displayAsIs, ConvertForDisplay(field, true));
+    ConvertForDisplay(field, false, display);
+    ASSERT_EQ(display, ConvertForDisplay(field, false));
+    ConvertForSort(field, sort);
+    ASSERT_EQ(sort, ConvertForSort(field));
+    ConvertSpaced(field, spaced);
+    ASSERT_EQ(spaced, ConvertSpaced(field));
+    ConvertWithBidi(field, bidi);
+    ASSERT_EQ(bidi, ConvertWithBidi(field));
+    BidiReorder(ReverseAndMirror(field), reorderBidi);
+    ASSERT_EQ(reorderBidi, BidiReorder(ReverseAndMirror(field)));
+  }
+}
+
+TEST(ReusedBuffers, AFieldOfSpacesEmptiesTheBuffer) {
+  std::string out = "earlier result";
+  ConvertWithBidi("     ", out);
+  EXPECT_EQ(out, "");
+  out = "earlier result";
+  ConvertForDisplay("   ", true, out);
+  EXPECT_EQ(out, "");
+  out = "earlier result";
+  BidiReorder(std::string("\0abc", 4), out);
+  EXPECT_EQ(out, "");
+}
 
 TEST(CutAtNull, TextBeforeTheFirstZero) {
   EXPECT_EQ(CutAtNull(std::string_view("AB\0C", 4)), "AB");
