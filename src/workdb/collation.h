@@ -17,6 +17,13 @@ inline constexpr const char* kHebrewCollation = "HEBREW";
 // Returns <0, 0 or >0.
 int CompareHebrew(std::string_view a, std::string_view b);
 
+// CompareHebrew always through ICU, without the shortcut that texts of printable ASCII alone
+// take; for tests that check the shortcut against it.
+int CompareHebrewWithIcu(std::string_view a, std::string_view b);
+// Whether texts of printable ASCII alone are compared without ICU: false when ICU has no
+// collation data or the shortcut's model of the collator failed its check at first use.
+bool HasAsciiShortcut();
+
 // Registers the HEBREW collation on `db`. The collator belongs to the connection and is
 // released when it closes. Returns an SQLite result code (SQLITE_OK on success).
 int RegisterHebrewCollation(sqlite3* db);
