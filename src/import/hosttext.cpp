@@ -4,6 +4,7 @@
 #include <unicode/utypes.h>
 
 #include <algorithm>
+#include <array>
 #include <limits>
 #include <vector>
 
@@ -135,6 +136,96 @@ bool ReadsAsStored(std::string_view t) {
   }
   if (allDigits) return true;
   return IsAsciiLetter(Byte(t.front())) && IsAsciiLetter(Byte(t.back()));
+}
+
+// Bidirectional classes of the bytes a right-to-left line is reordered by without ICU.
+// kOther marks every byte the rule below does not cover (Latin letters, controls, and the
+// code page's upper half apart from the Hebrew letters), which sends the line to ICU.
+enum class RtlClass : uint8_t {
+  kOther,
+  kLetter,
+  kDigit,
+  kSeparator,
+  kCommonSeparator,
+  kTerminator,
+  kNeutral
+};
+
+constexpr std::array<RtlClass, 256> MakeRtlClasses() {
+  std::array<RtlClass, 256> table{};
+  for (int b = 0x20; b <= 0x7E; ++b) table[b] = RtlClass::kNeutral;
+  for (int b = 'A'; b <= 'Z'; ++b) table[b] = RtlClass::kOther;
+  for (int b = 'a'; b <= 'z'; ++b) table[b] = RtlClass::kOther;
+  for (int b = '0'; b <= '9'; ++b) table[b] = RtlClass::kDigit;
+  table['+'] = table['-'] = RtlClass::kSeparator;
+  table[','] = table['.'] = table['/'] = table[':'] = RtlClass::kCommonSeparator;
+  table['#'] = table['$'] = table['%'] = RtlClass::kTerminator;
+  for (int b = kWinAlef; b <= kWinTav; ++b) table[b] = RtlClass::kLetter;
+  return table;
+}
+constexpr std::array<RtlClass, 256> kRtlClasses = MakeRtlClasses();
+
+// A line without left-to-right letters, in a right-to-left paragraph: every letter, space
+// and neutral resolves to right-to-left and only numbers rise a level, so the line reads
+// backwards with each number kept in its stored order. A number is a run of digits joined
+// by a single "+ - , . / :" between two digits, with any "# $ %" touching it. Returns false,
+// leaving `out` undefined, when the line holds a byte outside that shape; `t` is trimmed
+// and free of zero bytes. Agrees with ICU byte for byte (the tests compare them).
+bool ReorderRightToLeftLine(std::string_view t, std::string& out) {
+  const size_t n = t.size();
+  bool anyDigit = false;
+  for (const char c : t) {
+    const RtlClass k = kRtlClasses[Byte(c)];
+    if (k == RtlClass::kOther) return false;
+    anyDigit |= k == RtlClass::kDigit;
+  }
+  out.resize(n);
+  if (!anyDigit) {
+    std::reverse_copy(t.begin(), t.end(), out.begin());
+    return true;
+  }
+  // inNumber[i]: byte i belongs to a number.
+  thread_local std::vector<uint8_t> inNumber;
+  inNumber.assign(n, 0);
+  auto classAt = [&](size_t i) { return kRtlClasses[Byte(t[i])]; };
+  for (size_t i = 0; i < n; ++i) {
+    const RtlClass k = classAt(i);
+    if (k == RtlClass::kDigit) {
+      inNumber[i] = 1;
+    } else if ((k == RtlClass::kSeparator || k == RtlClass::kCommonSeparator) && i > 0 &&
+               i + 1 < n && classAt(i - 1) == RtlClass::kDigit &&
+               classAt(i + 1) == RtlClass::kDigit) {
+      inNumber[i] = 1;
+    }
+  }
+  // Terminators join after the separators have: "1.5%" is one number.
+  for (size_t i = 0; i < n;) {
+    if (classAt(i) != RtlClass::kTerminator) {
+      ++i;
+      continue;
+    }
+    size_t end = i;
+    while (end < n && classAt(end) == RtlClass::kTerminator) ++end;
+    if ((i > 0 && inNumber[i - 1]) || (end < n && inNumber[end])) {
+      std::fill(inNumber.begin() + static_cast<std::ptrdiff_t>(i),
+                inNumber.begin() + static_cast<std::ptrdiff_t>(end), 1);
+    }
+    i = end;
+  }
+  char* o = out.data();
+  for (size_t i = n; i > 0;) {
+    --i;
+    if (!inNumber[i]) {
+      *o++ = t[i];
+      continue;
+    }
+    size_t start = i;
+    while (start > 0 && inNumber[start - 1]) --start;
+    o = std::copy(t.begin() + static_cast<std::ptrdiff_t>(start),
+                  t.begin() + static_cast<std::ptrdiff_t>(i) + 1, o);
+    i = start;
+  }
+  return true;
 }
 
 // ICU's reordering into `out`; one reordering state per thread.
@@ -400,6 +491,7 @@ void BidiReorder(std::string_view s, std::string& reordered) {
     reordered.assign(t);
     return;
   }
+  if (ReorderRightToLeftLine(t, reordered)) return;
   ReorderWithIcu(t, reordered);
   const std::string_view kept = TrimSpaces(CutAtNull(reordered));
   if (kept.size() != reordered.size()) {

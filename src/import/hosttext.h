@@ -99,8 +99,8 @@ void BidiReorder(std::string_view s, std::string& out);
 int64_t HostIntValue(std::string_view s);
 
 namespace detail {
-// BidiReorder's ICU reordering alone, without cutting, trimming or the shortcut for text
-// that reads as stored; for tests that check the shortcut against it.
+// BidiReorder's ICU reordering alone, without cutting, trimming or the shortcuts that
+// reorder common lines without ICU; for tests that check the shortcuts against it.
 std::string BidiReorderWithIcu(std::string_view s);
 }  // namespace detail
 

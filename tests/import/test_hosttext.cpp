@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include <cctype>
 #include <random>
 #include <string>
 #include <thread>
@@ -315,6 +316,64 @@ TEST(BidiReorder, ShortcutAgreesWithIcu) {
     }
     const std::string icu(TrimSpaces(CutAtNull(detail::BidiReorderWithIcu(TrimSpaces(s)))));
     ASSERT_EQ(BidiReorder(s), icu) << "input: " << U8(s);
+  }
+}
+
+// What BidiReorder must give: ICU's reordering of the cut and trimmed line, cut and trimmed.
+std::string ReorderedByIcu(std::string_view s) {
+  return std::string(TrimSpaces(CutAtNull(detail::BidiReorderWithIcu(TrimSpaces(CutAtNull(s))))));
+}
+
+TEST(BidiReorder, RightToLeftLinesReadBackwardsWithNumbersKept) {
+  EXPECT_EQ(U8(BidiReorder(W("151 םיאנומשחה"))), "החשמונאים 151");
+  EXPECT_EQ(U8(BidiReorder(W("ופי-ביבא לת"))), "תל אביב-יפו");
+  EXPECT_EQ(U8(BidiReorder(W("מ\"עב )2004( ןמדירפ"))), "פרידמן (2004) בע\"מ");
+  // Separators join digits only singly and between two digits; terminators touching a number
+  // join it.
+  EXPECT_EQ(U8(BidiReorder(W("03-1234567 ןופלט"))), "טלפון 03-1234567");
+  EXPECT_EQ(U8(BidiReorder(W("1.5% החנה"))), "הנחה 1.5%");
+  EXPECT_EQ(U8(BidiReorder(W("1..2 א"))), "א 2..1");
+  EXPECT_EQ(U8(BidiReorder(W("12 34"))), "34 12");
+  EXPECT_EQ(U8(BidiReorder(W("- השמ -"))), "- משה -");
+}
+
+// Lines drawn from the alphabet of the right-to-left rule (Hebrew letters, digits, spaces,
+// ASCII punctuation) and from just outside it: the rule must give ICU's result on each, and
+// a byte outside it must send the line to ICU.
+TEST(BidiReorder, RightToLeftRuleAgreesWithIcu) {
+  std::string inside = W("אבגדהוזחטיךכלםמןנסעףפץצקרשת") + "0123456789      ";
+  for (int b = 0x21; b <= 0x7E; ++b) {
+    if (!std::isalnum(b)) inside += static_cast<char>(b);
+  }
+  std::string outside =
+      "AZaz\x7F\x01\t\n\r\x1C\x1F\x80\x81\x83\xA0\xA4\xC0\xC4\xCE\xD3\xD4\xD7"
+      "\xDF\xFB\xFC\xFD\xFE\xFF";
+  // Numbers and their joiners packed close, so that separators and terminators meet digits.
+  const std::string numeric = "0123456789+-,./:#$% ";
+  std::mt19937 rng(862);
+  auto below = [&](size_t n) { return std::uniform_int_distribution<size_t>(0, n - 1)(rng); };
+  std::string s;
+  for (int round = 0; round < 1500000; ++round) {
+    s.clear();
+    const size_t n = below(round % 10 == 0 ? 60 : 16) + 1;
+    const int kind = round % 4;
+    for (size_t i = 0; i < n; ++i) {
+      if (kind == 1 && below(2) == 0) {
+        s += numeric[below(numeric.size())];
+      } else {
+        s += inside[below(inside.size())];
+      }
+    }
+    if (kind == 2) {
+      // One byte from outside, anywhere, the edges included.
+      const size_t at = below(3) == 0 ? (below(2) == 0 ? 0 : s.size()) : below(s.size() + 1);
+      s.insert(at, 1, outside[below(outside.size())]);
+    } else if (kind == 3) {
+      // Punctuation and digits at the edges.
+      s.insert(0, 1, numeric[below(numeric.size())]);
+      s += numeric[below(numeric.size())];
+    }
+    ASSERT_EQ(BidiReorder(s), ReorderedByIcu(s)) << "input: " << U8(s);
   }
 }
 
