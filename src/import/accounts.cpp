@@ -204,8 +204,8 @@ class AccountWriter {
       zip_->SetOr(rs_, scratch_, " ");
       ConvertWithBidi(FieldOf(rec, kDistrictAt, kDistrictLen), scratch_);
       district_->SetOr(rs_, scratch_, " ");
-      ConvertWithBidi(ExtractHebrewWords(TrimSpaces(FieldOf(rec, kDetailsAt, kDetailsLen)), 20),
-                      scratch_);
+      ExtractHebrewWords(TrimSpaces(FieldOf(rec, kDetailsAt, kDetailsLen)), 20, words_);
+      ConvertWithBidi(words_, scratch_);
       details_->SetOr(rs_, scratch_, " ");
       ConvertSpaced(FieldOf(rec, kPhoneAt, kPhoneLen), scratch_);
       phone_->SetOr(rs_, TrimSpaces(scratch_), " ");
@@ -232,7 +232,7 @@ class AccountWriter {
       phone_, sortByCity_, sortByZip_;
   int sortByKeyVal_ = -1;
   // Conversion buffers reused from record to record (each column copies what it is given).
-  std::string displayKey_, nameText_, sortKey_, scratch_;
+  std::string displayKey_, nameText_, sortKey_, words_, scratch_;
 };
 
 }  // namespace

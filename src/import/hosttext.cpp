@@ -518,10 +518,10 @@ std::string ToHostLetter(std::string_view s) {
   return std::string(s);
 }
 
-std::string ExtractHebrewWords(std::string_view s, int16_t n) {
-  if (n <= 0) return {};
-  std::string reversed;
-  reversed.reserve(s.size());
+void ExtractHebrewWords(std::string_view s, int16_t n, std::string& out) {
+  out.clear();
+  if (n <= 0) return;
+  // Gathered from the reading start (the field's end) backwards, then turned round.
   bool seenHebrew = false;
   int counter = 0;
   for (auto it = s.rbegin(); it != s.rend(); ++it) {
@@ -529,19 +529,25 @@ std::string ExtractHebrewWords(std::string_view s, int16_t n) {
     const unsigned char b = Byte(c);
     if (c == ' ' || c == '-' || c == '.') {
       if (seenHebrew) {
-        reversed.push_back(c);
+        out.push_back(c);
         if (++counter == n) break;
       }
     } else if (IsHostHebrew(b)) {
-      reversed.push_back(c);
+      out.push_back(c);
       seenHebrew = true;
     } else if (IsAsciiLetter(b)) {
       break;
     }
   }
-  // The last n characters of the result are the first n put in front.
-  if (reversed.size() > static_cast<size_t>(n)) reversed.resize(static_cast<size_t>(n));
-  return std::string(reversed.rbegin(), reversed.rend());
+  // The last n characters of the result are the first n gathered.
+  if (out.size() > static_cast<size_t>(n)) out.resize(static_cast<size_t>(n));
+  std::reverse(out.begin(), out.end());
+}
+
+std::string ExtractHebrewWords(std::string_view s, int16_t n) {
+  std::string out;
+  ExtractHebrewWords(s, n, out);
+  return out;
 }
 
 std::string AlignRight(const std::optional<std::string_view>& v, int16_t n) {

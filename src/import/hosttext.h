@@ -93,6 +93,7 @@ void ConvertForSort(std::string_view s, std::string& out);
 void ConvertSpaced(std::string_view s, std::string& out);
 void ConvertWithBidi(std::string_view s, std::string& out);
 void BidiReorder(std::string_view s, std::string& out);
+void ExtractHebrewWords(std::string_view s, int16_t n, std::string& out);
 
 // The integer value of a text as the host's routines read it: surrounding spaces ignored,
 // a fractional number rounded (halves to even); throws HostTextError when not a number.

@@ -506,6 +506,23 @@ TEST(ExtractHebrewWords, EmptyAndNonPositiveLimit) {
   EXPECT_EQ(ExtractHebrewWords(Host("השמ"), -1), "");
 }
 
+TEST(ExtractHebrewWords, IntoABufferGivesTheSameWords) {
+  std::string out = "left over from the last record";
+  const std::string fields[] = {Host("ןהכ השמ"),
+                                Host("ה2ש1מ"),
+                                Host("X השמ"),
+                                Host("השמ X"),
+                                Host("זזזזז ווווו ההההה דדדדד גגגגג בבבבב אאאאא"),
+                                "",
+                                "   "};
+  for (const std::string& field : fields) {
+    for (const int16_t n : {int16_t{-1}, int16_t{0}, int16_t{3}, int16_t{20}}) {
+      ExtractHebrewWords(field, n, out);
+      EXPECT_EQ(out, ExtractHebrewWords(field, n)) << U8(field) << " n=" << n;
+    }
+  }
+}
+
 TEST(AlignRight, PadsOnTheLeft) {
   EXPECT_EQ(AlignRight(std::string_view("5"), 3), "  5");
   EXPECT_EQ(AlignRight(std::nullopt, 3), "   ");
