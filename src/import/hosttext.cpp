@@ -307,35 +307,35 @@ Date ParseHostDate(std::string_view s) {
   return Date::FromParts(year, month, day);
 }
 
-char ConvertChar(char c) {
-  switch (c) {
-    case '(':
-      return ')';
-    case ')':
-      return '(';
-    case '<':
-      return '>';
-    case '>':
-      return '<';
-    case '[':
-      return ']';
-    case ']':
-      return '[';
-    case '{':
-      return '}';
-    case '}':
-      return '{';
-    default:
-      break;
+namespace {
+
+// ConvertChar for every byte, looked up rather than decided, as it runs on every byte of
+// every converted field.
+constexpr std::array<char, 256> MakeConvertedChars() {
+  std::array<char, 256> table{};
+  for (int b = 0; b < 256; ++b) {
+    // The host's letters 0x80..0x9A sit 0x60 below their Windows-1255 places.
+    table[b] = static_cast<char>(b >= 0x80 && b <= 0x9A ? b + kHostToWinLetter : b);
   }
-  const unsigned char b = Byte(c);
-  return IsHostHebrew(b) ? MapHebrew(b) : c;
+  constexpr const char* kMirrorPairs[] = {"()", "<>", "[]", "{}"};
+  for (const char* pair : kMirrorPairs) {
+    table[static_cast<unsigned char>(pair[0])] = pair[1];
+    table[static_cast<unsigned char>(pair[1])] = pair[0];
+  }
+  return table;
+}
+constexpr std::array<char, 256> kConvertedChars = MakeConvertedChars();
+
+}  // namespace
+
+char ConvertChar(char c) {
+  return kConvertedChars[Byte(c)];
 }
 
 void ReverseAndMirror(std::string_view s, std::string& out) {
   out.resize(s.size());
   char* o = out.data();
-  for (auto it = s.rbegin(); it != s.rend(); ++it) *o++ = ConvertChar(*it);
+  for (auto it = s.rbegin(); it != s.rend(); ++it) *o++ = kConvertedChars[Byte(*it)];
 }
 
 std::string ReverseAndMirror(std::string_view s) {
@@ -473,7 +473,7 @@ void ConvertWithBidi(std::string_view s, std::string& out) {
   }
   thread_local std::string mirrored;
   mirrored.assign(t);
-  for (char& c : mirrored) c = ConvertChar(c);
+  for (char& c : mirrored) c = kConvertedChars[Byte(c)];
   BidiReorder(mirrored, out);
 }
 

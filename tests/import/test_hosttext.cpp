@@ -58,6 +58,23 @@ TEST(ConvertChar, MirrorsPairsAndMapsHebrew) {
   EXPECT_EQ(ConvertChar('\x9B'), '\x9B');
 }
 
+// Over all bytes: the eight mirror characters swap, the 27 host letters move up by 0x60,
+// and nothing else changes.
+TEST(ConvertChar, ChangesOnlyMirrorsAndHebrewLetters) {
+  const std::string mirrors = "()<>[]{}";
+  for (int b = 0; b <= 0xFF; ++b) {
+    const char c = static_cast<char>(b);
+    const size_t m = mirrors.find(c);
+    if (m != std::string::npos) {
+      EXPECT_EQ(ConvertChar(c), mirrors[m ^ 1]) << b;
+    } else if (b >= 0x80 && b <= 0x9A) {
+      EXPECT_EQ(ConvertChar(c), static_cast<char>(b + 0x60)) << b;
+    } else {
+      EXPECT_EQ(ConvertChar(c), c) << b;
+    }
+  }
+}
+
 TEST(ConvertChar, BytesOutsideTheHebrewLettersPassThrough) {
   for (int b = 0x9B; b <= 0xFF; ++b) {
     EXPECT_EQ(ConvertChar(static_cast<char>(b)), static_cast<char>(b)) << b;
