@@ -376,7 +376,7 @@ void frmLogon::CmdCheck_Click() {
   try {
     std::string folder = FromQ(txtConnDatabase_->text());
     // An empty box looks in the root folder, as "\act.fix" does.
-    if (folder.empty()) folder = "/";
+    if (folder.empty()) folder.assign(1, '/');
     if (folder.find('\0') != std::string::npos) {
       throw std::invalid_argument("שם המחיצה אינו תקין");
     }
