@@ -21,9 +21,8 @@ namespace {
 using importing::FieldOf;
 
 constexpr size_t kBatchRecord = 220;
-constexpr size_t kTypeAt = 1, kTypeLen = 3;
-constexpr size_t kKeysAt = 57, kKeyLen = 8;
-constexpr size_t kDateAt = 89, kValueDateAt = 92;
+// Type at 1 (3 bytes), four keys of 8 bytes at 57, the date at 89, the value date at 92.
+constexpr importing::TransactLayout kLayout{1, 3, 57, 8, 89, 92};
 
 bool EqualsNoCase(std::string_view a, std::string_view b) {
   if (a.size() != b.size()) return false;
@@ -89,27 +88,9 @@ int16_t ReadTempTransactions(const std::string& CompPath, const std::string& pDB
   try {
     importing::LedgerFilter filter(panel);
 
-    HostRecordFile file(CompPath, pFileName, kBatchRecord);
-    const int64_t n = RoundHalfEven(file.Count());
-
-    ProgressReporter progress(ui, static_cast<double>(n));
-    db::Database db = db::Database::Open(pDBFile);
-    db::TableRecordset rs = db.OpenTable("tTransact");
-    importing::TransactWriter writer(rs, pAsIs);
-
-    for (int64_t i = 1; i <= n; ++i) {
-      std::string_view rec = importing::RecordOf(file, i);
-      if (filter.Pass(FieldOf(rec, kTypeAt, kTypeLen), importing::DateAt(rec, kDateAt),
-                      importing::DateAt(rec, kValueDateAt))) {
-        for (size_t k = 0; k < 4; ++k) {
-          writer.Add(pJournalNo, static_cast<int32_t>(i),
-                     FieldOf(rec, kKeysAt + k * kKeyLen, kKeyLen));
-        }
-      }
-      if (i % 5 == 0) progress.Update(static_cast<double>(i));
-    }
-    rs.Close();
-    db.Close();
+    const HostRecordFile file(CompPath, pFileName, kBatchRecord);
+    importing::ImportTransactions(file, kLayout, pDBFile, pJournalNo, filter, pAsIs, ui,
+                                  [](std::string_view) { return true; });
     return -1;
   } catch (const std::exception& e) {
     ui.ShowMessage(e.what(), kTitleFault, MsgIcon::Information);

@@ -10,6 +10,7 @@
 #include <string_view>
 
 #include "control/panel.h"
+#include "control/userseam.h"
 #include "import/hostfile.h"
 #include "workdb/engine.h"
 #include "workdb/value.h"
@@ -135,5 +136,39 @@ class TransactWriter {
   size_t offered_ = 0;
   std::string offeredKeys_[kKeysPerTransaction];
 };
+
+// Where a transaction record keeps what the ledger criteria and tTransact read: the permanent
+// ledger and the temporary batches differ only in these offsets.
+struct TransactLayout {
+  size_t typeAt, typeLen, keysAt, keyLen, dateAt, valueDateAt;
+};
+
+// Reads every record of `file`, keeps those `accept(record)` lets through and `filter`
+// passes, and offers their four account keys to tTransact of `dbFile` under `fileId` (keys
+// converted as `asIs` says), with progress every fifth record. Throws what fails; the rows
+// appended before a failure stay.
+template <typename Accept>
+void ImportTransactions(const HostRecordFile& file, const TransactLayout& layout,
+                        const std::string& dbFile, int32_t fileId, LedgerFilter& filter, bool asIs,
+                        UserSeam& ui, Accept accept) {
+  const int64_t n = RoundHalfEven(file.Count());
+  ProgressReporter progress(ui, static_cast<double>(n));
+  db::Database db = db::Database::Open(dbFile);
+  db::TableRecordset rs = db.OpenTable("tTransact");
+  TransactWriter writer(rs, asIs);
+  for (int64_t i = 1; i <= n; ++i) {
+    std::string_view rec = RecordOf(file, i);
+    if (accept(rec) && filter.Pass(FieldOf(rec, layout.typeAt, layout.typeLen),
+                                   DateAt(rec, layout.dateAt), DateAt(rec, layout.valueDateAt))) {
+      for (size_t k = 0; k < 4; ++k) {
+        writer.Add(fileId, static_cast<int32_t>(i),
+                   FieldOf(rec, layout.keysAt + k * layout.keyLen, layout.keyLen));
+      }
+    }
+    if (i % 5 == 0) progress.Update(static_cast<double>(i));
+  }
+  rs.Close();
+  db.Close();
+}
 
 }  // namespace zdr::importing
