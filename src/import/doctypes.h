@@ -16,8 +16,8 @@ struct DocTypeDef {
   bool IsStockDoc = false;
 };
 
-inline constexpr int kDocTypeRows = 42;    // indexes 0..41
-inline constexpr int kDocTypesFilled = 28; // rows 0..27
+inline constexpr int kDocTypeRows = 42;     // indexes 0..41
+inline constexpr int kDocTypesFilled = 28;  // rows 0..27
 inline constexpr int kCashReceiptsRow = 26;
 inline constexpr int kAllSalesInvoicesRow = 27;
 

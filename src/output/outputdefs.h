@@ -23,7 +23,7 @@ struct LabelSettings {
 struct PostILSettings {
   std::string Service, Weight, Confirm, FilePath;  // UTF-8
   int16_t OpenExcel = 0;                           // 1: open the workbook when done
-  int16_t FileFormat = 0;                          // 0 "דואר ישראל", 1 "הובלות עם שחר"
+  int16_t FileFormat = 0;  // 0 "דואר ישראל", 1 "הובלות עם שחר"
 };
 
 inline constexpr std::array<const char*, 2> kFileFormatEntries{"דואר ישראל", "הובלות עם שחר"};

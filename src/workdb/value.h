@@ -34,7 +34,9 @@ namespace db {
 // Date fields hold the date's serial as a double.
 using Value = std::variant<std::monostate, int64_t, double, std::string>;
 
-inline bool IsNull(const Value& v) { return std::holds_alternative<std::monostate>(v); }
+inline bool IsNull(const Value& v) {
+  return std::holds_alternative<std::monostate>(v);
+}
 
 }  // namespace db
 }  // namespace zdr
