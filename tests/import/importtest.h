@@ -14,33 +14,17 @@
 
 #include "control/userseam.h"
 #include "import/codepage.h"
+#include "support/recordingseam.h"
 #include "workdb/engine.h"
 #include "workdb/schema.h"
 #include "zdrgen/generator.h"
 
 namespace zdr::importtest {
 
-struct ShownMessage {
-  std::string text, title;
-  MsgIcon icon;
-};
+using test::RecordingSeam;
+using test::ShownMessage;
 
 // Records messages, status lines and progress; answers every question with Yes.
-class RecordingSeam : public UserSeam {
- public:
-  void ShowMessage(std::string_view text, std::string_view title, MsgIcon icon) override {
-    messages.push_back({std::string(text), std::string(title), icon});
-  }
-  bool AskYesNo(std::string_view, std::string_view, MsgIcon) override { return true; }
-  void SetStatus(std::string_view text) override { statuses.emplace_back(text); }
-  void SetProgress(int fillWidth) override { progress.push_back(fillWidth); }
-  bool OpenInBrowser(const std::string&) override { return true; }
-  bool OpenInSpreadsheet(const std::string&) override { return true; }
-
-  std::vector<ShownMessage> messages;
-  std::vector<std::string> statuses;
-  std::vector<int> progress;
-};
 
 // A fixture with its own Temp folder (the working database goes there) and company folder.
 class ImportTest : public ::testing::Test {

@@ -19,11 +19,14 @@
 #include "import/doctypes.h"
 #include "output/output.h"
 #include "output/outputdefs.h"
+#include "support/recordingseam.h"
 #include "workdb/schema.h"
 
 #include "workdb/engine.h"
 
 namespace zdr::testing {
+
+using test::RecordingSeam;
 
 using Text = std::optional<std::string>;
 
@@ -37,30 +40,6 @@ struct HeadRow {
   std::string key;
   int64_t reference = 0;
   Text customerName, address1, address2, detailsLine1;
-};
-
-class RecordingSeam : public UserSeam {
- public:
-  void ShowMessage(std::string_view text, std::string_view title, MsgIcon) override {
-    messages.push_back(std::string(title) + ": " + std::string(text));
-  }
-  bool AskYesNo(std::string_view, std::string_view, MsgIcon) override { return true; }
-  void SetStatus(std::string_view text) override { status = text; }
-  void SetProgress(int fillWidth) override { progress.push_back(fillWidth); }
-  bool OpenInBrowser(const std::string& path) override {
-    opened.push_back(path);
-    return true;
-  }
-  bool OpenInSpreadsheet(const std::string& path) override {
-    opened.push_back(path);
-    return spreadsheetWorks;
-  }
-
-  std::vector<std::string> messages;
-  std::string status;
-  std::vector<int> progress;
-  std::vector<std::string> opened;
-  bool spreadsheetWorks = true;
 };
 
 inline std::string ReadBytes(const std::filesystem::path& p) {
@@ -114,7 +93,7 @@ class OutputTest : public ::testing::Test {
                       const std::vector<HeadRow>& heads = {}) {
     RecordingSeam createSeam;
     const std::string path = CreateWorkDB("", createSeam);
-    EXPECT_FALSE(path.empty()) << (createSeam.messages.empty() ? "" : createSeam.messages[0]);
+    EXPECT_FALSE(path.empty()) << (createSeam.messages.empty() ? "" : createSeam.messages[0].text);
     db::Database database = db::Database::Open(path);
     {
       db::TableRecordset t = database.OpenTable("tAccount");

@@ -28,6 +28,7 @@
 #include "import/hosttext.h"
 #include "import/importers.h"
 #include "select/select.h"
+#include "support/recordingseam.h"
 #include "workdb/schema.h"
 #include "zdrgen/generator.h"
 
@@ -35,22 +36,10 @@ namespace zdr {
 namespace {
 
 namespace fs = std::filesystem;
+using test::RecordingSeam;
 using Keys = std::multiset<std::string>;
 using zdrgen::HostDate;
 using zdrgen::HostField;
-
-class RecordingSeam : public UserSeam {
- public:
-  void ShowMessage(std::string_view text, std::string_view, MsgIcon) override {
-    messages.emplace_back(text);
-  }
-  bool AskYesNo(std::string_view, std::string_view, MsgIcon) override { return true; }
-  void SetStatus(std::string_view) override {}
-  void SetProgress(int) override {}
-  bool OpenInBrowser(const std::string&) override { return true; }
-  bool OpenInSpreadsheet(const std::string&) override { return true; }
-  std::vector<std::string> messages;
-};
 
 // One recipient row; Null text is an empty optional.
 struct Row {
@@ -113,7 +102,7 @@ class RowsTest : public ::testing::Test {
   // The data load, then the statement every output opens.
   std::vector<Row> Select(bool asIs = true) {
     ReadAllData(asIs, panel_, state_, docTypes_, seam_);
-    EXPECT_TRUE(seam_.messages.empty()) << seam_.messages.front();
+    EXPECT_TRUE(seam_.messages.empty()) << seam_.messages.front().text;
     db::Database db = db::Database::Open(state_.workDbPath);
     db::Snapshot s =
         db.OpenSnapshot(BuildRecipientsStatement(panel_, docTypes_, state_.selectDbPath));

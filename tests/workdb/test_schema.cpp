@@ -10,6 +10,7 @@
 #include <string>
 #include <vector>
 
+#include "support/recordingseam.h"
 #include "workdb/schema.h"
 
 namespace zdr {
@@ -17,24 +18,7 @@ namespace {
 
 namespace fs = std::filesystem;
 using db::FieldType;
-
-struct Shown {
-  std::string text, title;
-  MsgIcon icon;
-};
-
-class RecordingSeam : public UserSeam {
- public:
-  void ShowMessage(std::string_view text, std::string_view title, MsgIcon icon) override {
-    shown.push_back({std::string(text), std::string(title), icon});
-  }
-  bool AskYesNo(std::string_view, std::string_view, MsgIcon) override { return false; }
-  void SetStatus(std::string_view) override {}
-  void SetProgress(int) override {}
-  bool OpenInBrowser(const std::string&) override { return true; }
-  bool OpenInSpreadsheet(const std::string&) override { return true; }
-  std::vector<Shown> shown;
-};
+using test::RecordingSeam;
 
 // Sets an environment variable for the life of the object, then puts the old value back.
 class ScopedEnv {
@@ -115,7 +99,7 @@ constexpr FieldType kText = FieldType::Text;
 TEST_F(SchemaTest, WorkDbHasEveryTableFieldAndIndex) {
   const std::string path = CreateWorkDB("", ui_);
   ASSERT_EQ(path, (dir_ / "zdrlab.DB").string());
-  EXPECT_TRUE(ui_.shown.empty());
+  EXPECT_TRUE(ui_.messages.empty());
   db::Database work = db::Database::Open(path);
 
   const db::TableDef account = work.Describe("tAccount");
@@ -209,7 +193,7 @@ TEST_F(SchemaTest, LinkOnlyWhenTheSelectionDbPathIsSet) {
     db::Snapshot rows = work.OpenSnapshot("SELECT SortByKey FROM tSelectAccount");
     EXPECT_TRUE(rows.AtEnd());
   }
-  EXPECT_TRUE(ui_.shown.empty());
+  EXPECT_TRUE(ui_.messages.empty());
 }
 
 TEST_F(SchemaTest, SelectDbHasItsTableAndIndexes) {
@@ -237,7 +221,7 @@ TEST_F(SchemaTest, LeftoverFileIsReplacedWithoutAQuestion) {
   WriteFile(dir_ / "zdrlab.DB", "not a database at all");
   const std::string path = CreateWorkDB("", ui_);
   ASSERT_FALSE(path.empty());
-  EXPECT_TRUE(ui_.shown.empty());
+  EXPECT_TRUE(ui_.messages.empty());
   db::Database work = db::Database::Open(path);
   EXPECT_TRUE(work.HasTable("tAccount"));
 }
@@ -264,10 +248,10 @@ TEST_F(SchemaTest, RecreationEmptiesTheTables) {
 // Failures: shown as a fault, and nothing returned
 
 void ExpectFault(const RecordingSeam& ui) {
-  ASSERT_EQ(ui.shown.size(), 1u);
-  EXPECT_EQ(ui.shown[0].title, "תקלה");
-  EXPECT_EQ(ui.shown[0].icon, MsgIcon::Critical);
-  EXPECT_FALSE(ui.shown[0].text.empty());
+  ASSERT_EQ(ui.messages.size(), 1u);
+  EXPECT_EQ(ui.messages[0].title, "תקלה");
+  EXPECT_EQ(ui.messages[0].icon, MsgIcon::Critical);
+  EXPECT_FALSE(ui.messages[0].text.empty());
 }
 
 TEST_F(SchemaTest, TempUnderARegularFileIsAFault) {
@@ -276,14 +260,14 @@ TEST_F(SchemaTest, TempUnderARegularFileIsAFault) {
   EXPECT_EQ(CreateWorkDB("", ui_), "");
   ExpectFault(ui_);
   EXPECT_EQ(CreateSelectDB(ui_), "");
-  EXPECT_EQ(ui_.shown.size(), 2u);
+  EXPECT_EQ(ui_.messages.size(), 2u);
 }
 
 TEST_F(SchemaTest, TempMissingFolderIsAFault) {
   ScopedEnv temp("Temp", (dir_ / "missing").c_str());
   EXPECT_EQ(CreateSelectDB(ui_), "");
   ExpectFault(ui_);
-  EXPECT_NE(ui_.shown[0].text.find((dir_ / "missing").string()), std::string::npos);
+  EXPECT_NE(ui_.messages[0].text.find((dir_ / "missing").string()), std::string::npos);
   EXPECT_FALSE(fs::exists(dir_ / "missing"));
 }
 
@@ -306,7 +290,7 @@ TEST_F(SchemaTest, EmptyTempFallsBackToTheSystemFolder) {
   ScopedEnv temp("Temp", "");
   EXPECT_EQ(TempFolder(), system);
   EXPECT_EQ(CreateWorkDB("", ui_), (system / "zdrlab.DB").string());
-  EXPECT_TRUE(ui_.shown.empty());
+  EXPECT_TRUE(ui_.messages.empty());
 }
 
 TEST_F(SchemaTest, NoTempAtAllIsAFaultNotTheRootFolder) {
