@@ -4,7 +4,7 @@ JOBS ?= $(shell nproc)
 OUT ?= $(CURDIR)/out
 SAMPLE ?= $(CURDIR)/sample
 
-.PHONY: deps build build-release demo test test-asan bench run screenshots clean format
+.PHONY: deps build build-release build-strict demo test test-asan bench run screenshots clean format format-check
 
 deps:
 	@bash scripts/install-deps.sh
@@ -42,5 +42,16 @@ screenshots: build
 clean:
 	rm -rf build
 
+FORMATTED = find src tests tools bench \( -name '*.cpp' -o -name '*.h' \) -print0
+
 format:
-	@find src tests tools bench -name '*.cpp' -o -name '*.h' | xargs clang-format -i
+	@$(FORMATTED) | xargs -0 clang-format -i
+
+# Fails, naming the lines, when a source file is not as clang-format would have it.
+format-check: deps
+	@$(FORMATTED) | xargs -0 clang-format --dry-run --Werror
+
+# The release build with every warning an error.
+build-strict: deps
+	@cmake --preset release-strict >/dev/null
+	@cmake --build --preset release-strict -j $(JOBS)
