@@ -71,71 +71,107 @@ int16_t DatePart(std::string_view part, std::string_view whole) {
   return static_cast<int16_t>(v);
 }
 
-// Display order to reading order through ICU's inverse reordering. The UBiDi object and
+// The mirror image of a bracket or angle (the four pairs the host's screen mirrors), or 0.
+constexpr char MirroredBracket(char c) {
+  switch (c) {
+    case '(':
+      return ')';
+    case ')':
+      return '(';
+    case '<':
+      return '>';
+    case '>':
+      return '<';
+    case '[':
+      return ']';
+    case ']':
+      return '[';
+    case '{':
+      return '}';
+    case '}':
+      return '{';
+    default:
+      return 0;
+  }
+}
+
+// True for the brackets the bidirectional algorithm pairs.
+constexpr bool IsPairedBracket(char c) {
+  return c == '(' || c == ')' || c == '[' || c == ']' || c == '{' || c == '}';
+}
+
+// Display order to reading order through ICU's inverse reordering. The UBiDi objects and
 // the buffers live as long as the thread and are reused from call to call.
 class InverseBidi {
  public:
-  InverseBidi() : bidi_(ubidi_open()) {
-    if (bidi_ != nullptr) ubidi_setReorderingMode(bidi_, UBIDI_REORDER_INVERSE_LIKE_DIRECT);
+  InverseBidi() : inverse_(ubidi_open()), direct_(ubidi_open()) {
+    if (inverse_ != nullptr) ubidi_setReorderingMode(inverse_, UBIDI_REORDER_INVERSE_LIKE_DIRECT);
   }
   ~InverseBidi() {
-    if (bidi_ != nullptr) ubidi_close(bidi_);
+    if (inverse_ != nullptr) ubidi_close(inverse_);
+    if (direct_ != nullptr) ubidi_close(direct_);
   }
   InverseBidi(const InverseBidi&) = delete;
   InverseBidi& operator=(const InverseBidi&) = delete;
 
   // Windows-1255 in display order to Windows-1255 in reading order, same length, into
-  // `result`.
+  // `result`. A bracket that ends in right-to-left text is mirrored (the screen showed it
+  // turned round); one that resolves left to right, inside Latin text, stays as shown.
   void Reorder(std::string_view s, std::string& result) {
-    if (bidi_ == nullptr) throw HostTextError("סידור הטקסט הדו-כיווני נכשל (ICU)");
+    if (inverse_ == nullptr || direct_ == nullptr) {
+      throw HostTextError("סידור הטקסט הדו-כיווני נכשל (ICU)");
+    }
     in_.resize(s.size());
     for (size_t i = 0; i < s.size(); ++i) {
       in_[i] = static_cast<UChar>(Win1255ToCodePoint(Byte(s[i])));
     }
+    const auto n = static_cast<int32_t>(in_.size());
     UErrorCode err = U_ZERO_ERROR;
-    ubidi_setPara(bidi_, in_.data(), static_cast<int32_t>(in_.size()), UBIDI_RTL, nullptr, &err);
-    out_.resize(in_.size() + 16);
-    int32_t n = 0;
-    if (U_SUCCESS(err)) {
-      n = ubidi_writeReordered(bidi_, out_.data(), static_cast<int32_t>(out_.size()), 0, &err);
-      if (err == U_BUFFER_OVERFLOW_ERROR) {
-        err = U_ZERO_ERROR;
-        out_.resize(static_cast<size_t>(n));
-        n = ubidi_writeReordered(bidi_, out_.data(), n, 0, &err);
+    ubidi_setPara(inverse_, in_.data(), n, UBIDI_RTL, nullptr, &err);
+    const UBiDiLevel* levels = U_SUCCESS(err) ? ubidi_getLevels(inverse_, &err) : nullptr;
+    if (U_SUCCESS(err)) levels_.assign(levels, levels + n);
+    // The inverse reordering leaves brackets to the neutral rules, so a pair around Latin
+    // text at the end of a line went to the line's direction. The direct reordering pairs
+    // them: a bracket takes the level it gives, on the text as shown, where a pair of either
+    // direction still opens before it closes.
+    if (U_SUCCESS(err) && std::any_of(s.begin(), s.end(), IsPairedBracket)) {
+      ubidi_setPara(direct_, in_.data(), n, UBIDI_RTL, nullptr, &err);
+      const UBiDiLevel* paired = U_SUCCESS(err) ? ubidi_getLevels(direct_, &err) : nullptr;
+      if (U_SUCCESS(err)) {
+        for (int32_t i = 0; i < n; ++i) {
+          if (IsPairedBracket(s[static_cast<size_t>(i)])) levels_[i] = paired[i];
+        }
       }
     }
     if (U_FAILURE(err)) {
       throw HostTextError(std::string("סידור הטקסט הדו-כיווני נכשל: ") + u_errorName(err));
     }
-    result.resize(static_cast<size_t>(n));
-    for (int32_t i = 0; i < n; ++i) {
-      const int b = CodePointToWin1255(out_[static_cast<size_t>(i)]);
-      // Every code unit came from a Windows-1255 byte and reordering without mirroring
-      // adds none of its own, so the byte always exists.
-      result[static_cast<size_t>(i)] = b >= 0 ? static_cast<char>(b) : '?';
+    map_.resize(in_.size());
+    ubidi_reorderVisual(levels_.data(), n, map_.data());
+    result.resize(s.size());
+    for (size_t i = 0; i < s.size(); ++i) {
+      const auto from = static_cast<size_t>(map_[i]);
+      const char c = s[from];
+      const char mirrored = (levels_[from] & 1) != 0 ? MirroredBracket(c) : 0;
+      result[i] = mirrored != 0 ? mirrored : c;
     }
   }
 
  private:
-  UBiDi* bidi_ = nullptr;
+  UBiDi* inverse_ = nullptr;
+  UBiDi* direct_ = nullptr;
   std::vector<UChar> in_;
-  std::vector<UChar> out_;
+  std::vector<UBiDiLevel> levels_;
+  std::vector<int32_t> map_;
 };
 
-// Text whose reading order equals its display order under the reordering above: printable
-// ASCII beginning and ending with a Latin letter, or digits alone. (Read from the right, as
-// the reordering reads display order, a number after a neutral at the end would form a run
-// of its own and move.)
-bool ReadsAsStored(std::string_view t) {
-  if (t.empty()) return true;
-  bool allDigits = true;
-  for (const char c : t) {
+// True when the line holds a Hebrew letter (Windows-1255). A line without one was typed
+// left to right and is shown as typed.
+bool HasHebrewLetter(std::string_view t) {
+  return std::any_of(t.begin(), t.end(), [](char c) {
     const unsigned char b = Byte(c);
-    if (b < 0x20 || b > 0x7E) return false;
-    if (b < '0' || b > '9') allDigits = false;
-  }
-  if (allDigits) return true;
-  return IsAsciiLetter(Byte(t.front())) && IsAsciiLetter(Byte(t.back()));
+    return b >= kWinAlef && b <= kWinTav;
+  });
 }
 
 // Bidirectional classes of the bytes a right-to-left line is reordered by without ICU.
@@ -167,10 +203,11 @@ constexpr std::array<RtlClass, 256> kRtlClasses = MakeRtlClasses();
 
 // A line without left-to-right letters, in a right-to-left paragraph: every letter, space
 // and neutral resolves to right-to-left and only numbers rise a level, so the line reads
-// backwards with each number kept in its stored order. A number is a run of digits joined
-// by a single "+ - , . / :" between two digits, with any "# $ %" touching it. Returns false,
-// leaving `out` undefined, when the line holds a byte outside that shape; `t` is trimmed
-// and free of zero bytes. Agrees with ICU byte for byte (the tests compare them).
+// backwards with each number kept in its stored order, and every bracket, being right to
+// left, is mirrored. A number is a run of digits joined by a single "+ - , . / :" between
+// two digits, with any "# $ %" touching it. Returns false, leaving `out` undefined, when the
+// line holds a byte outside that shape; `t` is trimmed and free of zero bytes. Agrees with
+// ICU byte for byte (the tests compare them).
 bool ReorderRightToLeftLine(std::string_view t, std::string& out) {
   const size_t n = t.size();
   bool anyDigit = false;
@@ -180,8 +217,12 @@ bool ReorderRightToLeftLine(std::string_view t, std::string& out) {
     anyDigit |= k == RtlClass::kDigit;
   }
   out.resize(n);
+  auto mirrored = [](char c) {
+    const char m = MirroredBracket(c);
+    return m != 0 ? m : c;
+  };
   if (!anyDigit) {
-    std::reverse_copy(t.begin(), t.end(), out.begin());
+    std::transform(t.rbegin(), t.rend(), out.begin(), mirrored);
     return true;
   }
   // inNumber[i]: byte i belongs to a number.
@@ -216,7 +257,7 @@ bool ReorderRightToLeftLine(std::string_view t, std::string& out) {
   for (size_t i = n; i > 0;) {
     --i;
     if (!inNumber[i]) {
-      *o++ = t[i];
+      *o++ = mirrored(t[i]);
       continue;
     }
     size_t start = i;
@@ -471,10 +512,14 @@ void ConvertWithBidi(std::string_view s, std::string& out) {
     out.clear();
     return;
   }
-  thread_local std::string mirrored;
-  mirrored.assign(t);
-  for (char& c : mirrored) c = kConvertedChars[Byte(c)];
-  BidiReorder(mirrored, out);
+  // Letters only: which brackets to mirror is decided by the reordering, which knows the
+  // direction each one ends in.
+  thread_local std::string letters;
+  letters.assign(t);
+  for (char& c : letters) {
+    if (IsHostHebrew(Byte(c))) c = MapHebrew(Byte(c));
+  }
+  BidiReorder(letters, out);
 }
 
 std::string ConvertWithBidi(std::string_view s) {
@@ -487,7 +532,7 @@ void BidiReorder(std::string_view s, std::string& reordered) {
   // The field ends at its first zero byte; reordering past it would carry the padding
   // into the middle of the line.
   const std::string_view t = TrimSpaces(CutAtNull(s));
-  if (ReadsAsStored(t)) {
+  if (!HasHebrewLetter(t)) {
     reordered.assign(t);
     return;
   }

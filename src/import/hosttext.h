@@ -61,13 +61,16 @@ std::string ConvertForSort(std::string_view s);
 // As ConvertForSort, but the Latin/digit part is followed by one space, punctuation within
 // Hebrew after Latin becomes a space, and the double quote stays.
 std::string ConvertSpaced(std::string_view s);
-// Trimmed, mirrored through ConvertChar in place, then BidiReorder. A field of spaces
-// gives the empty text without reordering.
+// Trimmed, Hebrew letters mapped in place, then BidiReorder (which mirrors the brackets
+// that need it). A field of spaces gives the empty text without reordering.
 std::string ConvertWithBidi(std::string_view s);
-// Display order to reading order (Windows-1255 in and out, no mirroring): a right-to-left
-// line reordered as the host's screen showed it. The line ends at its first zero byte; the
-// result is trimmed and as long as the line needs (no length cap). Safe to call from
-// several threads (each keeps its own reordering state).
+// Display order to reading order, Windows-1255 in and out: the line as the host's screen
+// showed it, read back. A line with a Hebrew letter is a right-to-left line; its brackets
+// that resolve right to left were shown mirrored and are turned back, those inside Latin
+// text stay. A line without a Hebrew letter was typed left to right and comes back as
+// shown. The line ends at its first zero byte; the result is trimmed and as long as the
+// line needs (no length cap). Safe to call from several threads (each keeps its own
+// reordering state).
 std::string BidiReorder(std::string_view s);
 // The text before the first zero byte (a view into `s`).
 std::string_view CutAtNull(std::string_view s);
@@ -100,8 +103,9 @@ void ExtractHebrewWords(std::string_view s, int16_t n, std::string& out);
 int64_t HostIntValue(std::string_view s);
 
 namespace detail {
-// BidiReorder's ICU reordering alone, without cutting, trimming or the shortcuts that
-// reorder common lines without ICU; for tests that check the shortcuts against it.
+// BidiReorder's ICU reordering of a right-to-left line (brackets mirrored as BidiReorder
+// mirrors them) alone, without cutting, trimming, the left-to-right rule or the shortcut
+// that reorders common lines without ICU; for tests that check the shortcut against it.
 std::string BidiReorderWithIcu(std::string_view s);
 }  // namespace detail
 

@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <filesystem>
 #include <fstream>
 #include <iterator>
@@ -296,7 +297,10 @@ TEST_F(CompanyTest, CompanyNameReadsBackThroughTheSpacedConversion) {
 
 TEST_F(CompanyTest, NamesAndAddressesRoundTripThroughTheBidiConversion) {
   HostRecordFile act(folder(), "ACT.fix", 650);
-  int checked = 0;
+  int checked = 0, latinWithNumber = 0, latinBrackets = 0;
+  auto latin = [](const std::string& t) {
+    return !t.empty() && std::all_of(t.begin(), t.end(), [](char c) { return c > 0; });
+  };
   for (const AccountTruth& a : truth_->accounts) {
     if (a.deleted || !a.unambiguousText) continue;
     std::string_view r = act.Record(a.record);
@@ -307,8 +311,15 @@ TEST_F(CompanyTest, NamesAndAddressesRoundTripThroughTheBidiConversion) {
     EXPECT_EQ(zdr::ConvertWithBidi(r.substr(135, 15)), W(a.city));
     EXPECT_EQ(zdr::ConvertWithBidi(r.substr(150, 5)), W(a.zip));
     ++checked;
+    for (const std::string* t : {&a.name, &a.address}) {
+      latinWithNumber += latin(*t) && t->find_first_of("0123456789") != std::string::npos;
+    }
+    latinBrackets += a.name.find("(Israel)") != std::string::npos;
   }
   EXPECT_GT(checked, 150);
+  // Latin lines ending in a number and Latin text in brackets, in Latin and in Hebrew lines.
+  EXPECT_GT(latinWithNumber, 0);
+  EXPECT_GT(latinBrackets, 0);
 }
 
 TEST_F(CompanyTest, KeysAndTelephonesRoundTripThroughTheSortKeyConversions) {
@@ -331,9 +342,7 @@ TEST_F(CompanyTest, KeysAndTelephonesRoundTripThroughTheSortKeyConversions) {
         EXPECT_EQ(zdr::ReverseAndMirror(key), W(a.key));
       }
     }
-    if (a.telephone.find(',') == std::string::npos) {
-      EXPECT_EQ(TrimSpaces(zdr::ConvertSpaced(TrimSpaces(r.substr(60, 30)))), W(a.telephone));
-    }
+    EXPECT_EQ(TrimSpaces(zdr::ConvertSpaced(TrimSpaces(r.substr(60, 30)))), W(a.telephone));
     EXPECT_EQ(r.substr(38, 3), a.sortCode);
     EXPECT_EQ(r.substr(52, 4), a.cutOff);
     EXPECT_EQ(static_cast<unsigned char>(r[324]), a.agent);

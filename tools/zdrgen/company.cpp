@@ -32,8 +32,10 @@ const char* const kFamilies[] = {"כהן",   "לוי",    "מזרחי",  "פרץ
                                  "חדד",   "גבאי",   "שפירא",  "רוזנברג", "גולדשטיין", "בן דוד"};
 const char* const kTrades[] = {"מאפיית", "מוסך", "נגריית", "חשמל", "שיווק", "סחר",
                                "מסעדת",  "פרחי", "ספריית", "יבוא", "בניין", "אופטיקה"};
-const char* const kLatinCompanies[] = {"Intel Israel Ltd", "Tadiran (1995)", "Osem Group",
-                                       "A.B. Trading",     "Delta Galil",    "Strauss Co"};
+const char* const kLatinCompanies[] = {"Intel Israel Ltd",   "Tadiran (1995)",    "Osem Group",
+                                       "A.B. Trading",       "Delta Galil",       "Strauss Co",
+                                       "Studio 54",          "Osem (Israel) Ltd", "IBM (Israel)",
+                                       "Osem (Israel) בע\"מ"};
 const char* const kLatinWords[] = {"IBM", "HP", "Intel", "Sano", "Elite"};
 const char* const kStreets[] = {"הרצל",    "רוטשילד",  "ז'בוטינסקי",  "בן גוריון", "העצמאות",
                                 "הנביאים", "דרך בגין", "שד' ירושלים", "החשמונאים", "ויצמן",
@@ -81,15 +83,17 @@ std::string PersonName(Random& r) {
   return std::string(r.Pick(kFirstNames)) + " " + r.Pick(kFamilies);
 }
 
-// True when punctuation stands at an edge of the line next to a Latin run ("Tadiran (1995)"):
-// in a right-to-left line such a character takes the line's direction and moves to the far
-// side of the Latin run, so the display reads back with it on the wrong side.
+// True when punctuation stands at an edge of a right-to-left line next to a Latin run
+// ("פרץ 5 Intel."): such a character takes the line's direction and moves to the far side of
+// the Latin run, so the display reads back with it on the wrong side. A line without a
+// Hebrew letter is left to right and reads back as typed.
 bool LatinEdgePunctuation(const std::string& text) {
   auto latinOrDigit = [](char c) {
     return (c >= '0' && c <= '9') || (c >= 'A' && c <= 'Z') || (c >= 'a' && c <= 'z');
   };
   auto strong = [&](char c) { return latinOrDigit(c) || (static_cast<unsigned char>(c) >= 0x80); };
-  if (text.empty()) return false;
+  auto hebrew = [](char c) { return static_cast<unsigned char>(c) >= 0x80; };
+  if (std::none_of(text.begin(), text.end(), hebrew)) return false;
   // Nearest strong character to each end.
   auto firstStrong = std::find_if(text.begin(), text.end(), strong);
   auto lastStrong = std::find_if(text.rbegin(), text.rend(), strong);
@@ -196,7 +200,12 @@ struct Generator {
     std::string text;
     if (kind == 0) return "";
     if (kind == 1) {
-      text = "ת.ד. " + std::to_string(rnd.Between(1, 9999));
+      // A post-office box, or an address the clerk typed in Latin letters.
+      const int n = rnd.Between(1, 9999);
+      text = n % 3 == 0 ? "ת.ד. " + std::to_string(n)
+             : n % 3 == 1
+                 ? "PO Box " + std::to_string(n)
+                 : "Room " + std::to_string(n % 40 + 1) + ", Floor " + std::to_string(n % 9 + 1);
     } else if (kind <= 3) {
       text = street + " " + std::to_string(rnd.Between(1, 200)) + " דירה " +
              std::to_string(rnd.Between(1, 40));

@@ -90,9 +90,12 @@ std::string HostVisual(std::string_view logicalUtf8) {
   for (char16_t c : text) Cp862Byte(c);  // refuse what the host cannot hold before reordering
   thread_local std::unique_ptr<UBiDi, BidiCloser> bidi(ubidi_open());
   UErrorCode err = U_ZERO_ERROR;
-  // The host's screen is a right-to-left line: the paragraph level is RTL whatever the text.
+  // The host's screen is a right-to-left line, except for text without a Hebrew letter,
+  // which the clerk typed left to right.
+  const bool hebrew =
+      std::any_of(text.begin(), text.end(), [](char16_t c) { return c >= 0x05D0 && c <= 0x05EA; });
   ubidi_setPara(bidi.get(), reinterpret_cast<const UChar*>(text.data()),
-                static_cast<int32_t>(text.size()), UBIDI_RTL, nullptr, &err);
+                static_cast<int32_t>(text.size()), hebrew ? UBIDI_RTL : UBIDI_LTR, nullptr, &err);
   std::u16string visual(text.size() + 8, u'\0');
   int32_t n = ubidi_writeReordered(bidi.get(), reinterpret_cast<UChar*>(visual.data()),
                                    static_cast<int32_t>(visual.size()), UBIDI_DO_MIRRORING, &err);

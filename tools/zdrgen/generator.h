@@ -37,9 +37,10 @@ inline constexpr char kDeletedMark = '\x01';
 // ---------------------------------------------------------------------------------------
 // Host text.
 
-// Encodes logical UTF-8 text as code page 862 in display order: the paragraph is taken as
-// right-to-left, runs are reordered for display and brackets in right-to-left runs are
-// mirrored, as the host shows them. Handles Hebrew letters (U+05D0..U+05EA) and printable
+// Encodes logical UTF-8 text as code page 862 in display order: a text with a Hebrew letter
+// is a right-to-left paragraph, its runs are reordered for display and brackets in
+// right-to-left runs are mirrored; a text without one was typed left to right and is shown
+// as typed. Both as the host shows them. Handles Hebrew letters (U+05D0..U+05EA) and printable
 // ASCII; throws std::invalid_argument on any other character or on malformed UTF-8.
 std::string HostVisual(std::string_view logicalUtf8);
 
