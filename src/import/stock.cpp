@@ -93,18 +93,21 @@ class HeadWriter {
     std::string_view address1 = TrimSpaces(FieldOf(head, kAddress1At, kAddressLen));
     std::string_view address2 = TrimSpaces(FieldOf(head, kAddress2At, kAddressLen));
     std::string_view details = TrimSpaces(FieldOf(head, kDetailsAt, kDetailsLen));
-    // A field that converts to nothing (quotes or brackets only) stays Null: the table refuses
-    // an empty text, and refusing it would end the whole import.
+    // Name and address are read like the account's own (in reading order, whatever the
+    // load): the sheet and the dispatch file print the same recipient. Only the key, spread
+    // one character per cell, is reversed for the as-is load. A field that converts to
+    // nothing stays Null: the table refuses an empty text, and refusing it would end the
+    // whole import.
     if (!name.empty()) {
-      ConvertForDisplay(name, asIs_, scratch_);
+      ConvertWithBidi(name, scratch_);
       name_.SetOrNull(rs_, scratch_);
     }
     if (!address1.empty()) {
-      ConvertForDisplay(address1, asIs_, scratch_);
+      ConvertWithBidi(address1, scratch_);
       address1_.SetOrNull(rs_, scratch_);
     }
     if (!address2.empty()) {
-      ConvertForDisplay(address2, asIs_, scratch_);
+      ConvertWithBidi(address2, scratch_);
       address2_.SetOrNull(rs_, scratch_);
       sortByCity_.SetOrNull(rs_, scratch_);
     }

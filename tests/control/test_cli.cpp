@@ -8,6 +8,7 @@
 #include <cstdio>
 #include <filesystem>
 #include <fstream>
+#include <set>
 #include <sstream>
 #include <string>
 #include <vector>
@@ -206,6 +207,98 @@ TEST_F(CliTest, CityPrefixSelectsOnlyThatCity) {
     pos = c;
   }
   EXPECT_GT(rows, 0u);
+}
+
+// The text of a page cell or a dispatch field as the clerk reads it: markup undone, a comma
+// as the dispatch file writes it (a blank), no surrounding blanks.
+std::string Readable(std::string t) {
+  const std::pair<std::string, std::string> entities[] = {
+      {"&nbsp;", ""}, {"&lt;", "<"}, {"&gt;", ">"}, {"&amp;", "&"}};
+  for (const auto& [from, to] : entities) {
+    for (size_t at = t.find(from); at != std::string::npos; at = t.find(from, at + to.size()))
+      t.replace(at, from.size(), to);
+  }
+  for (char& c : t) c = c == ',' ? ' ' : c;
+  const size_t first = t.find_first_not_of(' ');
+  return first == std::string::npos ? "" : t.substr(first, t.find_last_not_of(' ') - first + 1);
+}
+
+// The texts between `open` and `close` from `from` on, in order.
+std::vector<std::string> Between(const std::string& page, const std::string& open,
+                                 const std::string& close) {
+  std::vector<std::string> out;
+  for (size_t at = page.find(open); at != std::string::npos; at = page.find(open, at)) {
+    at += open.size();
+    const size_t end = page.find(close, at);
+    out.push_back(Readable(page.substr(at, end - at)));
+  }
+  return out;
+}
+
+using Recipients = std::multiset<std::string>;  // "name | address | city"
+
+std::string Recipient(const std::string& name, const std::string& address,
+                      const std::string& city) {
+  return name + " | " + address + " | " + city;
+}
+
+// Regression: with addresses from the document header, the label sheet and the list printed
+// the header's name and address reversed ("12 הרצל" as "הרצל 21"), while the dispatch file
+// had them in reading order. The three outputs agree on every recipient, by accounts and by
+// documents.
+TEST_F(CliTest, DocumentAddressOnTheSheetWasReversed) {
+  const std::vector<std::vector<std::string>> variants = {
+      {},
+      {"--set", "UseDates=1", "--set", "FromDate=01/01/2000", "--set", "ToDate=31/12/2015", "--set",
+       "DocType=27", "--set", "AddressFrom=0"}};
+  for (const auto& criteria : variants) {
+    SCOPED_TRACE(criteria.empty() ? "accounts" : "documents");
+    auto run = [&](const std::string& command, std::vector<std::string> extra) {
+      auto args = Base(command);
+      args.insert(args.end(), criteria.begin(), criteria.end());
+      args.insert(args.end(), extra.begin(), extra.end());
+      const RunResult r = Run(args);
+      EXPECT_EQ(r.exitCode, 0) << r.err;
+    };
+    run("labels", {"--set", "UseTitle1=1", "--set", "UseTitle4=1", "--set", "UseTitle5=1"});
+    run("list", {});
+    run("post", {"--set", "FilePath=" + (temp_ / "post.xlsx").string(), "--set", "FileFormat=1"});
+
+    const std::string sheet = zdr::Win1255ToUtf8(ReadFile(temp_ / "zdrlab1.htm"));
+    const auto names = Between(sheet, "<tr class='Line1' align='right'><td>", "</td></tr>");
+    const auto addresses = Between(sheet, "<tr class='Line4' align='right'><td>", "</td></tr>");
+    const auto cities = Between(sheet, "<tr class='Line5' align='right'><td>", "</td></tr>");
+    ASSERT_EQ(names.size(), addresses.size());
+    ASSERT_EQ(names.size(), cities.size());
+    Recipients onSheet;
+    for (size_t i = 0; i < names.size(); ++i)
+      onSheet.insert(Recipient(names[i], addresses[i], cities[i]));
+
+    const std::string list = zdr::Win1255ToUtf8(ReadFile(temp_ / "zdrlab2.htm"));
+    const auto cells = Between(list, "    <td dir=rtl", "</td>");
+    ASSERT_EQ(cells.size() % 4, 0u);
+    Recipients inList;
+    // City, address, contact, name; each cell text after its attributes' ">".
+    auto cell = [&](size_t i) { return Readable(cells[i].substr(cells[i].find('>') + 1)); };
+    for (size_t i = 0; i < cells.size(); i += 4)
+      inList.insert(Recipient(cell(i + 3), cell(i + 1), cell(i)));
+
+    std::istringstream csv(zdr::Win1255ToUtf8(ReadFile(temp_ / "zdpost1.csv")));
+    std::string line;
+    std::getline(csv, line);  // headings
+    Recipients inFile;
+    while (std::getline(csv, line)) {
+      if (!line.empty() && line.back() == '\r') line.pop_back();
+      std::vector<std::string> f;
+      std::stringstream fields(line);
+      for (std::string v; std::getline(fields, v, ',');) f.push_back(Readable(v));
+      ASSERT_GE(f.size(), 5u) << line;
+      inFile.insert(Recipient(f[1], f[2], f[4]));  // key, name, street, number, city
+    }
+    EXPECT_FALSE(onSheet.empty());
+    EXPECT_EQ(onSheet, inList);
+    EXPECT_EQ(onSheet, inFile);
+  }
 }
 
 }  // namespace

@@ -123,6 +123,7 @@ TEST_F(DocumentImport, HeaderFieldOfQuotesOnlyStaysNullInsteadOfEndingImport) {
   zdrgen::DocHeaderFields h;
   h.name = "\"\"";
   h.address2 = "()";
+  h.details = "\"()\"";
   h.lineCount = 1;
   zdrgen::DocLineFields l;
   l.itemKey = "I1";
@@ -135,9 +136,9 @@ TEST_F(DocumentImport, HeaderFieldOfQuotesOnlyStaysNullInsteadOfEndingImport) {
   EXPECT_TRUE(seam_.messages.empty());
   EXPECT_EQ(Heads(), (Strings{"1", "4"}));
   EXPECT_EQ(Rows(db_,
-                 "SELECT CustomerName, Address2, SortByName, SortByZip FROM tStockHead "
-                 "WHERE HeadIndx = 1"),
-            Strings{"<null>|<null>|''|()"});
+                 "SELECT CustomerName, Address2, DetailsLine1, SortByName, SortByZip FROM "
+                 "tStockHead WHERE HeadIndx = 1"),
+            Strings{"\"\"|()|<null>|''|()"});
 }
 
 TEST_F(DocumentImport, AllSalesInvoicesTakesCodesZeroToFour) {
