@@ -35,11 +35,11 @@ void WriteListHead(CodePageFile& f, Date today) {
   f.Line("  <tr><td colspan='5'><hr noshade size='2'></td></tr>");
 }
 
-// "<prefix>" + the value as text (the word Null for a null value) + "</td>".
+// "<prefix>" + the value as text (an empty cell, "&nbsp;", for a null value) + "</td>".
 void CellLine(CodePageFile& f, std::string& line, const char* prefix, const db::Value& v) {
   line = prefix;
   if (db::IsNull(v)) {
-    line += "Null";
+    line += "&nbsp;";
   } else if (const auto* s = std::get_if<std::string>(&v)) {
     AppendHtmlEscaped(*s, line);
   } else {

@@ -57,10 +57,10 @@ TEST_F(AddressListTest, WholeListExact) {
                            "    <td dir=rtl dir=rtl>כהן משה</td>",
                            "  </tr>",
                            "  <tr valign='middle' bgcolor='#FFFFFF' align='right'>",
-                           "    <td>Null</td>",
-                           "    <td dir=rtl>Null</td>",
-                           "    <td dir=rtl>Null</td>",
-                           "    <td dir=rtl>Null</td>",
+                           "    <td>&nbsp;</td>",
+                           "    <td dir=rtl>&nbsp;</td>",
+                           "    <td dir=rtl>&nbsp;</td>",
+                           "    <td dir=rtl>&nbsp;</td>",
                            "    <td dir=rtl dir=rtl>לוי</td>",
                            "  </tr>",
                            "</table>",
@@ -135,6 +135,23 @@ TEST_F(AddressListTest, DocumentZipIsAnEmptyCell) {
 }
 
 // Faults mended.
+
+// Regression: an empty field of the document header printed the word "Null" in the list.
+TEST_F(AddressListTest, EmptyHeaderFieldPrintedTheWordNull) {
+  UseDocuments();
+  const std::string out = PathOf("zdrlab2.htm");
+  CreateHTML(out,
+             BuildDb({{"1", "חשבון", "כתובת", "עכו", "24000", "", "", "04"}},
+                     {{"1", 501, std::nullopt, std::nullopt, std::nullopt, std::nullopt}}),
+             panel, docTypes, "", seam, Date::FromParts(2024, 12, 31));
+  const std::string list = Utf8File(out);
+  EXPECT_EQ(list.find("Null"), std::string::npos);
+  EXPECT_NE(list.find("    <td></td>\r\n    <td dir=rtl>&nbsp;</td>\r\n"
+                      "    <td dir=rtl>&nbsp;</td>\r\n    <td dir=rtl>&nbsp;</td>\r\n"
+                      "    <td dir=rtl dir=rtl>&nbsp;</td>\r\n"),
+            std::string::npos)
+      << list;
+}
 
 TEST_F(AddressListTest, ValuesWithMarkupAreEscaped) {
   const std::string list = Write({{"1", "A&B <סניף>", "<i>", "a&b", "<9>", "", "x>y", ""}});
