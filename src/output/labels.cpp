@@ -51,6 +51,22 @@ void WriteStyles(CodePageFile& f, const LabelSettings& labels) {
   }
 }
 
+// Printing rules: each page table fills one printed page and breaks after it, so every
+// sheet lands on a page of its own with the same grid; the paper's own margins are the
+// label stock's. The cells keep their sizes whatever a label holds: a label is a block of
+// the cell's height, centred, whose long words wrap and whose overflow is cut off, so it
+// neither widens its column nor pushes the rows below it.
+void WritePageRules(CodePageFile& f, const SheetGeometry& g) {
+  f.Line("       @page {margin:0}");
+  f.Line("       body {margin:0}");
+  f.Line("       body > table {page-break-after:always; height:100vh; table-layout:fixed}");
+  f.Line(
+      "       body > table > tbody > tr > td > table {display:flex; flex-direction:column; "
+      "justify-content:safe center; width:90%; height:" +
+      PercentOfOne(g.rows) + "vh; margin:0 auto; overflow:hidden}");
+  f.Line("       td td {line-height:1.1; overflow-wrap:anywhere}");
+}
+
 void AppendEscapedText(const db::Value& v, std::string& out) {
   if (const auto* s = std::get_if<std::string>(&v)) {
     AppendHtmlEscaped(*s, out);
@@ -59,10 +75,11 @@ void AppendEscapedText(const db::Value& v, std::string& out) {
   }
 }
 
-// The field's text for a label line: the word Null for a null value.
+// The field's text for a label line: an empty line for a null value (an empty field of a
+// document header), as for the telephone.
 void AppendLineText(const db::Value& v, std::string& out) {
   if (db::IsNull(v)) {
-    out += "Null";
+    out += "&nbsp;";
   } else {
     AppendEscapedText(v, out);
   }
@@ -200,6 +217,7 @@ void CreateLabFile(const std::string& pFileName, const std::string& pDBFile, con
   output_internal::WritePageHead(f);
   f.Line("<style>");
   WriteStyles(f, labels);
+  WritePageRules(f, g);
   f.Line("</style>");
   f.Line("</HEAD>");
   f.Line("<BODY BGCOLOR='#FFFFFF'>");

@@ -11,7 +11,18 @@ const std::string kPageOpen =
     "<table height='100%' width='100%' border='0' cellpadding='0' cellspacing='0' dir='rtl'>";
 const std::string kInnerOpen = "     <table border='0' cellpadding='1' cellspacing='0' dir='rtl'>";
 
-std::vector<std::string> SheetHead(const std::vector<std::string>& styles) {
+// The printing rules after the line styles, for a sheet of `rows` rows ("12.5" for 8).
+std::vector<std::string> PageRules(const std::string& rowHeight = "12.5") {
+  return {"       @page {margin:0}", "       body {margin:0}",
+          "       body > table {page-break-after:always; height:100vh; table-layout:fixed}",
+          "       body > table > tbody > tr > td > table {display:flex; flex-direction:column; "
+          "justify-content:safe center; width:90%; height:" +
+              rowHeight + "vh; margin:0 auto; overflow:hidden}",
+          "       td td {line-height:1.1; overflow-wrap:anywhere}"};
+}
+
+std::vector<std::string> SheetHead(const std::vector<std::string>& styles,
+                                   const std::string& rowHeight = "12.5") {
   std::vector<std::string> l = {
       "<HTML>",
       "<!-- saved from url=(0024)http://www.vornak.co.il/ -->",
@@ -20,6 +31,8 @@ std::vector<std::string> SheetHead(const std::vector<std::string>& styles) {
       "<meta http-equiv='Content-Type' content='text/html; charset=windows-1255'>",
       "<style>"};
   l.insert(l.end(), styles.begin(), styles.end());
+  const auto rules = PageRules(rowHeight);
+  l.insert(l.end(), rules.begin(), rules.end());
   l.insert(l.end(), {"</style>", "</HEAD>", "<BODY BGCOLOR='#FFFFFF'>"});
   return l;
 }
@@ -114,7 +127,7 @@ TEST_F(LabelSheetTest, EveryLineOfOneSheetExact) {
       "    <tr valign='middle' align='center'><td><img border='0' src='/img/top.png'></td></tr>";
   const std::string bottom =
       "    <tr valign='middle' align='center'><td><img border='0' src='/img/bottom.png'></td></tr>";
-  std::vector<std::string> want = SheetHead(DefaultStyles());
+  std::vector<std::string> want = SheetHead(DefaultStyles(), "100.0");
   want.insert(want.end(), {kPageOpen, "  <tr valign='middle' align='right'>"});
   for (const auto& l :
        cell({top, "    <tr class='Line0' align='right'><td>לכבוד</td></tr>",
@@ -133,9 +146,9 @@ TEST_F(LabelSheetTest, EveryLineOfOneSheetExact) {
              "    <tr class='Line1' align='right'><td>לוי</td></tr>",
              "    <tr align='right'><td><table class='Line2' cellspacing='0' cellpadding='0' "
              "border='0' align='right' dir='rtl'><tr><td>7</td></tr></table></td></tr>",
-             "    <tr class='Line3' align='right'><td>Null</td></tr>",
-             "    <tr class='Line4' align='right'><td>Null</td></tr>",
-             "    <tr class='Line6' align='right'><td>Null</td></tr>",
+             "    <tr class='Line3' align='right'><td>&nbsp;</td></tr>",
+             "    <tr class='Line4' align='right'><td>&nbsp;</td></tr>",
+             "    <tr class='Line6' align='right'><td>&nbsp;</td></tr>",
              "    <tr class='Line5' align='right'><td>    32000</td></tr>",
              "    <tr class=Line7 align='right'><td>&nbsp;</td></tr>", bottom}))
     want.push_back(l);
@@ -224,12 +237,12 @@ TEST_F(LabelSheetTest, CityAndZipSwitches) {
   panel.ChkTitle[5] = 1;
   std::string sheet = Write(rows);
   EXPECT_EQ(Count(sheet, "<tr class='Line5' align='right'><td>חיפה</td></tr>"), 1u);
-  EXPECT_EQ(Count(sheet, "<tr class='Line5' align='right'><td>Null</td></tr>"), 1u);
+  EXPECT_EQ(Count(sheet, "<tr class='Line5' align='right'><td>&nbsp;</td></tr>"), 1u);
   panel.ChkTitle[5] = 0;
   panel.ChkTitle[8] = 1;
   sheet = Write(rows);
   EXPECT_EQ(Count(sheet, "<tr class='Line5' align='right'><td>31000</td></tr>"), 1u);
-  EXPECT_EQ(Count(sheet, "<tr class='Line5' align='right'><td>Null</td></tr>"), 1u);
+  EXPECT_EQ(Count(sheet, "<tr class='Line5' align='right'><td>&nbsp;</td></tr>"), 1u);
   panel.ChkTitle[5] = 1;
   sheet = Write(rows);
   EXPECT_EQ(Count(sheet, "<tr class='Line5' align='right'><td>חיפה    31000</td></tr>"), 1u);
@@ -285,6 +298,24 @@ TEST_F(LabelSheetTest, MissingDatabaseIsAnEngineError) {
 }
 
 // Faults mended.
+
+// Regression: an empty field of the document header printed the word "Null" on the label.
+TEST_F(LabelSheetTest, EmptyHeaderFieldPrintedTheWordNull) {
+  UseDocuments();
+  panel.ChkTitle = {0, 1, 0, 0, 1, 1, 0, 0, 0};
+  const std::string out = PathOf("zdrlab1.htm");
+  CreateLabFile(out,
+                BuildDb({{"1", "חשבון", "כתובת", "עכו", "24000", "", "", "04"}},
+                        {{"1", 501, std::nullopt, std::nullopt, std::nullopt, std::nullopt}}),
+                panel, docTypes, "", labels, seam);
+  const std::string sheet = Utf8File(out);
+  EXPECT_EQ(sheet.find("Null"), std::string::npos);
+  for (const char* line : {"Line1", "Line4", "Line5"}) {
+    EXPECT_EQ(Count(sheet, "<tr class='" + std::string(line) + "' align='right'><td>&nbsp;</td>"),
+              1u)
+        << line;
+  }
+}
 
 TEST_F(LabelSheetTest, ValuesWithMarkupAreEscaped) {
   panel.ChkTitle = {1, 1, 1, 1, 1, 1, 1, 1, 1};
