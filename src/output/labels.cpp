@@ -55,7 +55,8 @@ void WriteStyles(CodePageFile& f, const LabelSettings& labels) {
 // sheet lands on a page of its own with the same grid; the paper's own margins are the
 // label stock's. The cells keep their sizes whatever a label holds: a label is a block of
 // the cell's height, centred, whose long words wrap and whose overflow is cut off, so it
-// neither widens its column nor pushes the rows below it.
+// neither widens its column nor pushes the rows below it. A blank line keeps its height, so
+// the labels of a sheet are as tall as each other and their first lines stand in line.
 void WritePageRules(CodePageFile& f, const SheetGeometry& g) {
   f.Line("       @page {margin:0}");
   f.Line("       body {margin:0}");
@@ -64,7 +65,7 @@ void WritePageRules(CodePageFile& f, const SheetGeometry& g) {
       "       body > table > tbody > tr > td > table {display:flex; flex-direction:column; "
       "justify-content:safe center; width:90%; height:" +
       PercentOfOne(g.rows) + "vh; margin:0 auto; overflow:hidden}");
-  f.Line("       td td {line-height:1.1; overflow-wrap:anywhere}");
+  f.Line("       td td {height:1.1em; line-height:1.1; overflow-wrap:anywhere}");
 }
 
 void AppendEscapedText(const db::Value& v, std::string& out) {

@@ -18,7 +18,7 @@ std::vector<std::string> PageRules(const std::string& rowHeight = "12.5") {
           "       body > table > tbody > tr > td > table {display:flex; flex-direction:column; "
           "justify-content:safe center; width:90%; height:" +
               rowHeight + "vh; margin:0 auto; overflow:hidden}",
-          "       td td {line-height:1.1; overflow-wrap:anywhere}"};
+          "       td td {height:1.1em; line-height:1.1; overflow-wrap:anywhere}"};
 }
 
 std::vector<std::string> SheetHead(const std::vector<std::string>& styles,
