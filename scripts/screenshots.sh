@@ -1,7 +1,8 @@
 #!/usr/bin/env bash
 # screenshots.sh BUILD_DIR DOCS_DIR
 # Renders the panel and each of its dialogs offscreen, with the Culmus Hebrew fonts, into
-# PNG files in DOCS_DIR. The picker and the company chooser show three generated sample
+# PNG files in DOCS_DIR, then the demo's label sheet (pages 1 and 2, as headless Chromium
+# prints it) and its address list (as Chromium shows it). The picker and the company chooser show three generated sample
 # companies; the user's own settings are neither read nor changed.
 set -euo pipefail
 build="$1"; docs="$2"
@@ -17,4 +18,15 @@ trap 'rm -rf "$work"' EXIT
 export Temp="$work"
 export QT_QPA_PLATFORM=offscreen
 "$build/src/zdrlab" --screenshots "$docs" --company "$work/companies/company1"
+
+bash "$(dirname "$0")/demo.sh" "$build" "$work/demo-sample" "$work/demo-out" >/dev/null
+chromium=(chromium --headless --no-sandbox --disable-gpu --disable-background-networking
+  --disable-component-update --disable-sync --no-first-run --user-data-dir="$work/chromium")
+"${chromium[@]}" --no-pdf-header-footer --print-to-pdf="$work/sheet.pdf" \
+  "file://$work/demo-out/zdrlab1.htm" >/dev/null 2>&1
+pdftoppm -r 72 -png -f 1 -l 2 "$work/sheet.pdf" "$work/sheet"
+mv "$work"/sheet-*1.png "$docs/sheet-page1.png"
+mv "$work"/sheet-*2.png "$docs/sheet-page2.png"
+"${chromium[@]}" --hide-scrollbars --window-size=1000,900 --screenshot="$docs/list.png" \
+  "file://$work/demo-out/zdrlab2.htm" >/dev/null 2>&1
 ls "$docs"/*.png
