@@ -5,6 +5,7 @@
 #include "control/settings.h"
 #include "import/importers.h"
 #include "workdb/schema.h"
+#include "workdb/worklock.h"
 
 namespace zdr {
 
@@ -46,9 +47,15 @@ std::string Control::PrepareAccountPicker() {
   const bool scan = state_.selectDbPath.empty() || ui_.AskYesNo("לסרוק מחדש את רשימת הכרטיסים?",
                                                                 kTitleAttention, MsgIcon::Question);
   if (scan) {
-    state_.selectDbPath = CreateSelectDB(ui_);
-    ui_.SetStatus("קורא רשימת כרטיסים");
-    ReadACT(state_.companyPath, state_.selectDbPath, false, false, panel_, ui_);
+    // zdracc.DB is shared by every run of this temporary folder: rebuilt under the lock.
+    try {
+      const auto lock = LockWorkFiles();
+      state_.selectDbPath = CreateSelectDB(ui_);
+      ui_.SetStatus("קורא רשימת כרטיסים");
+      ReadACT(state_.companyPath, state_.selectDbPath, false, false, panel_, ui_);
+    } catch (const WorkFilesLockError& e) {
+      ui_.ShowMessage(e.what(), kTitleFault, MsgIcon::Critical);
+    }
   }
   state_.pickerSortIndex = static_cast<int16_t>(panel_.CmbSortBy);
   return state_.selectDbPath;
