@@ -3,6 +3,7 @@
 // shown under "תקלה" and ends the command.
 #include <exception>
 #include <filesystem>
+#include <optional>
 #include <system_error>
 
 #include "control/control.h"
@@ -10,6 +11,7 @@
 #include "output/output.h"
 #include "workdb/engine.h"
 #include "workdb/schema.h"
+#include "workdb/worklock.h"
 
 namespace zdr {
 namespace {
@@ -23,9 +25,29 @@ std::string TempFile(const char* name) {
   return (TempFolder() / name).string();
 }
 
-std::filesystem::path PathFromUtf8(const std::string& s) {
-  return std::filesystem::path(std::u8string(s.begin(), s.end()));
-}
+// Passes everything on to the person's seam and notes whether a failure was shown, so that
+// a load that went wrong does not replace the user's workbook.
+class FailureWatch : public UserSeam {
+ public:
+  explicit FailureWatch(UserSeam& ui) : ui_(ui) {}
+  void ShowMessage(std::string_view text, std::string_view title, MsgIcon icon) override {
+    if (IsFailureMessage(title, icon)) failed_ = true;
+    ui_.ShowMessage(text, title, icon);
+  }
+  bool AskYesNo(std::string_view text, std::string_view title, MsgIcon icon) override {
+    return ui_.AskYesNo(text, title, icon);
+  }
+  void SetStatus(std::string_view text) override { ui_.SetStatus(text); }
+  void SetProgress(int fillWidth) override { ui_.SetProgress(fillWidth); }
+  void YieldToEvents() override { ui_.YieldToEvents(); }
+  bool OpenInBrowser(const std::string& path) override { return ui_.OpenInBrowser(path); }
+  bool OpenInSpreadsheet(const std::string& path) override { return ui_.OpenInSpreadsheet(path); }
+  bool failed() const { return failed_; }
+
+ private:
+  UserSeam& ui_;
+  bool failed_ = false;
+};
 
 void OpenPage(UserSeam& ui, const std::string& path) {
   if (!ui.OpenInBrowser(path)) throw CommandError("לא ניתן לפתוח את הדפדפן על הקובץ " + path);
@@ -43,6 +65,7 @@ template <typename WritePage>
 static std::string RunPageCommand(Control& control, const char* fileName, WritePage writePage) {
   UserSeam& ui = control.ui();
   try {
+    const auto lock = LockWorkFiles();
     control.ReadAllData(true);
     ui.YieldToEvents();
     ui.SetStatus("מכין רשימה");
@@ -69,28 +92,35 @@ std::string Control::CmdPreview() {
   });
 }
 
+// The dispatch file. The workbook named by FilePath is checked before anything is loaded,
+// and replaced only by a complete workbook from a load that reported no failure: until then
+// the old file stays as it was.
 std::string Control::CmdBuildPostIL() {
   try {
     if (postIL_.FilePath.empty()) {
       ui_.ShowMessage("לא הוגדר קובץ פלט", kTitleError, MsgIcon::Critical);
       return "";
     }
-    const std::filesystem::path target = PathFromUtf8(postIL_.FilePath);
-    std::error_code ec;
-    if (std::filesystem::exists(target, ec)) {
-      std::filesystem::remove(target, ec);
-      if (ec)
-        throw CommandError("לא ניתן למחוק את הקובץ הקודם " + postIL_.FilePath + ": " +
-                           ec.message());
+    try {
+      CheckWorkbookTarget(postIL_.FilePath, state_.companyPath);
+    } catch (const OutputError& e) {
+      ui_.ShowMessage(e.what(), kTitleError, MsgIcon::Critical);
+      return "";
     }
-    ReadAllData(false);
+    const auto lock = LockWorkFiles();
+    FailureWatch watch(ui_);
+    zdr::ReadAllData(false, panel_, state_, docTypes_, watch);
     ui_.YieldToEvents();
     ui_.SetStatus("מכין קובץ");
     const std::string csv = TempFile("zdpost1.csv");
     CreateCSV(csv, state_.workDbPath, postIL_.FileFormat, panel_, docTypes_, state_.selectDbPath,
-              postIL_, ui_);
+              postIL_, watch);
+    if (watch.failed()) {
+      throw CommandError("הקובץ " + postIL_.FilePath +
+                         " לא נכתב מחדש, כי קריאת הנתונים לא הושלמה (ראו את ההודעה הקודמת)");
+    }
     ui_.YieldToEvents();
-    ConvertToExcel(csv, postIL_.FilePath, postIL_.OpenExcel == 1, ui_);
+    ConvertToExcel(csv, postIL_.FilePath, postIL_.OpenExcel == 1, ui_, state_.companyPath);
     ui_.SetStatus("הכנת הקובץ הסתיימה");
     return postIL_.FilePath;
   } catch (const std::exception& e) {

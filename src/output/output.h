@@ -90,12 +90,20 @@ std::string SpreadInCells(const db::Value& v, std::string_view pClass);
 // return and line feed turned into a blank, cut to `pMaxLen` characters when pMaxLen > 0.
 std::string CsvField(const db::Value& v, int pMaxLen);
 
-// Saves the dispatch file `pCsvFile` as a workbook at `pXlsFile`: ".xlsx" directly, other
-// extensions through LibreOffice when it is installed. The header row and every value are
-// text except the reference column, which is a number. With `pOpenExcel` the sheet reads
-// right to left and the workbook is handed to ui.OpenInSpreadsheet. Throws OutputError.
+// Checks, before anything is loaded or written, that a workbook can be saved at `pXlsFile`:
+// it is not a folder, not inside the company folder `companyPath` (links resolved), not named
+// as a host file (*.fix, a*.tmp), its extension is .xlsx, or .xls or .ods with LibreOffice
+// installed, and its folder exists. Throws OutputError saying what is wrong.
+void CheckWorkbookTarget(const std::string& pXlsFile, const std::string& companyPath);
+
+// Saves the dispatch file `pCsvFile` as a workbook at `pXlsFile`: ".xlsx" directly, ".xls"
+// and ".ods" through LibreOffice. The header row and every value are text except the
+// reference column, which is a number. The target is checked as CheckWorkbookTarget does;
+// the workbook is written to a new file beside it and renamed over it only when complete,
+// so on any failure the old file stays as it was. With `pOpenExcel` the sheet reads right
+// to left and the workbook is handed to ui.OpenInSpreadsheet. Throws OutputError.
 void ConvertToExcel(const std::string& pCsvFile, const std::string& pXlsFile, bool pOpenExcel,
-                    UserSeam& ui);
+                    UserSeam& ui, const std::string& companyPath = {});
 
 // Pieces the writers share.
 namespace output_internal {

@@ -1,6 +1,7 @@
 // The dispatch file as a workbook: libxlsxwriter writes .xlsx; other formats go through
 // LibreOffice's headless converter when it is installed.
 #include <spawn.h>
+#include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 #include <xlsxwriter.h>
@@ -172,10 +173,98 @@ fs::path TempDir() {
   return fs::temp_directory_path();
 }
 
-void ConvertWithOffice(const std::vector<std::string>& lines, const fs::path& target,
-                       bool rightToLeft) {
+fs::path PathFromUtf8(const std::string& s) {
+  return fs::path(std::u8string(s.begin(), s.end()));
+}
+
+std::string FindOffice() {
   std::string office = FindOnPath("soffice");
   if (office.empty()) office = FindOnPath("libreoffice");
+  return office;
+}
+
+// Formats LibreOffice writes for us; .xlsx is written here directly.
+bool ConvertedByOffice(const std::string& lowerExt) {
+  return lowerExt == ".xls" || lowerExt == ".ods";
+}
+
+// The path with every symbolic link resolved, as far as it exists.
+fs::path Resolved(const fs::path& p) {
+  std::error_code ec;
+  fs::path abs = fs::absolute(p, ec);
+  if (ec) return p.lexically_normal();
+  fs::path canon = fs::weakly_canonical(abs, ec);
+  return ec ? abs.lexically_normal() : canon;
+}
+
+bool IsWithin(const fs::path& path, const fs::path& folder) {
+  auto p = path.begin();
+  for (auto f = folder.begin(); f != folder.end(); ++f, ++p) {
+    if (f->empty() && std::next(f) == folder.end()) break;  // a trailing separator
+    if (p == path.end() || *p != *f) return false;
+  }
+  return true;
+}
+
+// The names the host accounting system gives its files: record files "*.fix" (ACT.fix,
+// ADF.FIX, amv.fix ...) and the temporary batches "a*.tmp".
+bool IsHostFileName(const fs::path& p) {
+  const std::string name = Lower(p.filename().string());
+  const auto endsWith = [&](std::string_view tail) {
+    return name.size() >= tail.size() &&
+           name.compare(name.size() - tail.size(), tail.size(), tail) == 0;
+  };
+  return endsWith(".fix") || (name.size() > 5 && name[0] == 'a' && endsWith(".tmp"));
+}
+
+// A new file beside the target that the workbook is written into. Commit() renames it over
+// the target; until then, and when the run fails, the old target stays as it was and the
+// new file is removed.
+class PendingFile {
+ public:
+  explicit PendingFile(const fs::path& target) : target_(target) {
+    std::string pattern =
+        (target.parent_path() / ("." + target.filename().string() + ".XXXXXX")).string();
+    const int fd = ::mkstemp(pattern.data());
+    if (fd < 0) {
+      throw OutputError("לא ניתן ליצור קובץ בתיקייה של " + target.string() + ": " +
+                        std::strerror(errno));
+    }
+    // mkstemp makes the file private; give it the mode a new file of this user gets.
+    const mode_t mask = ::umask(0);
+    ::umask(mask);
+    ::fchmod(fd, 0666 & ~mask);
+    ::close(fd);
+    path_ = pattern;
+  }
+  ~PendingFile() {
+    if (!path_.empty()) {
+      std::error_code ec;
+      fs::remove(path_, ec);
+    }
+  }
+  PendingFile(const PendingFile&) = delete;
+  PendingFile& operator=(const PendingFile&) = delete;
+
+  const fs::path& path() const { return path_; }
+
+  void Commit() {
+    std::error_code ec;
+    fs::rename(path_, target_, ec);
+    if (ec) {
+      throw OutputError("לא ניתן לשמור את הקובץ " + target_.string() + ": " + ec.message());
+    }
+    path_.clear();
+  }
+
+ private:
+  fs::path target_;
+  fs::path path_;
+};
+
+void ConvertWithOffice(const std::vector<std::string>& lines, const fs::path& target,
+                       const fs::path& into, bool rightToLeft) {
+  const std::string office = FindOffice();
   if (office.empty()) {
     throw OutputError("לא נמצאה תוכנה שממירה לתבנית " + target.extension().string() +
                       ". יש לבחור קובץ פלט שסיומתו .xlsx");
@@ -205,25 +294,58 @@ void ConvertWithOffice(const std::vector<std::string>& lines, const fs::path& ta
   if (rc != 0 || !fs::exists(produced, ec)) {
     throw OutputError("ההמרה לתבנית " + ext + " נכשלה. יש לבחור קובץ פלט שסיומתו .xlsx");
   }
-  fs::copy_file(produced, target, fs::copy_options::overwrite_existing, ec);
+  fs::copy_file(produced, into, fs::copy_options::overwrite_existing, ec);
   if (ec) throw OutputError("לא ניתן לשמור את הקובץ " + target.string() + ": " + ec.message());
 }
 
 }  // namespace
 
-void ConvertToExcel(const std::string& pCsvFile, const std::string& pXlsFile, bool pOpenExcel,
-                    UserSeam& ui) {
+void CheckWorkbookTarget(const std::string& pXlsFile, const std::string& companyPath) {
   if (pXlsFile.empty()) throw OutputError("לא הוגדר קובץ פלט");
-  const std::vector<std::string> lines = ReadCsvLines(pCsvFile);
-  const fs::path target(pXlsFile);
-  const std::string ext = Lower(target.extension().string());
-  if (ext == ".xlsx") {
-    WriteXlsx(lines, pXlsFile, pOpenExcel);
-  } else if (ext.size() < 2) {
-    throw OutputError("לקובץ הפלט " + pXlsFile + " אין סיומת. יש לבחור קובץ פלט שסיומתו .xlsx");
-  } else {
-    ConvertWithOffice(lines, target, pOpenExcel);
+  const fs::path target = PathFromUtf8(pXlsFile);
+  const fs::path resolved = Resolved(target);
+  std::error_code ec;
+  if (fs::is_directory(resolved, ec)) {
+    throw OutputError("קובץ הפלט " + pXlsFile + " הוא תיקייה. יש לבחור שם של קובץ");
   }
+  if (!companyPath.empty() && IsWithin(resolved, Resolved(PathFromUtf8(companyPath)))) {
+    throw OutputError("קובץ הפלט " + pXlsFile +
+                      " נמצא בתיקיית החברה. יש לבחור קובץ פלט מחוץ לתיקיית הנהלת החשבונות");
+  }
+  if (IsHostFileName(resolved) || IsHostFileName(target)) {
+    throw OutputError("קובץ הפלט " + pXlsFile +
+                      " הוא בשם של קובץ הנהלת חשבונות. יש לבחור קובץ פלט שסיומתו .xlsx");
+  }
+  const std::string ext = Lower(target.extension().string());
+  if (ext.size() < 2) {
+    throw OutputError("לקובץ הפלט " + pXlsFile + " אין סיומת. יש לבחור קובץ פלט שסיומתו .xlsx");
+  }
+  if (ext != ".xlsx" && !ConvertedByOffice(ext)) {
+    throw OutputError("לא ניתן לכתוב גיליון עבודה בתבנית " + target.extension().string() +
+                      ". יש לבחור קובץ פלט שסיומתו .xlsx, .xls או .ods");
+  }
+  if (ext != ".xlsx" && FindOffice().empty()) {
+    throw OutputError("לא נמצאה תוכנה שממירה לתבנית " + target.extension().string() +
+                      ". יש לבחור קובץ פלט שסיומתו .xlsx");
+  }
+  if (!fs::is_directory(resolved.parent_path(), ec)) {
+    throw OutputError("התיקייה של קובץ הפלט " + pXlsFile + " לא נמצאה");
+  }
+}
+
+void ConvertToExcel(const std::string& pCsvFile, const std::string& pXlsFile, bool pOpenExcel,
+                    UserSeam& ui, const std::string& companyPath) {
+  CheckWorkbookTarget(pXlsFile, companyPath);
+  const std::vector<std::string> lines = ReadCsvLines(pCsvFile);
+  const fs::path target = PathFromUtf8(pXlsFile);
+  // Written beside the file a link points to, so the link keeps pointing at the workbook.
+  PendingFile pending(Resolved(target));
+  if (Lower(target.extension().string()) == ".xlsx") {
+    WriteXlsx(lines, pending.path().string(), pOpenExcel);
+  } else {
+    ConvertWithOffice(lines, target, pending.path(), pOpenExcel);
+  }
+  pending.Commit();
   if (pOpenExcel && !ui.OpenInSpreadsheet(pXlsFile)) {
     throw OutputError("לא ניתן לפתוח את הקובץ " + pXlsFile + " בתוכנת הגיליונות");
   }
