@@ -34,10 +34,12 @@ std::string_view StripLeadingSeparators(std::string_view name) {
   return name;
 }
 
+// A regular file, or a link to one. A FIFO or a device is not a host file: reading one
+// could wait forever.
 bool IsFileEntry(const std::filesystem::path& p) {
   std::error_code ec;
   auto st = std::filesystem::status(p, ec);
-  return !ec && std::filesystem::exists(st) && !std::filesystem::is_directory(st);
+  return !ec && std::filesystem::is_regular_file(st);
 }
 
 std::string ErrnoText(int err) {
@@ -94,7 +96,9 @@ void HostRecordFile::OpenPath(const std::filesystem::path& path) {
   path_ = path;
   if (recLen_ == 0) throw HostFileError("אורך רשומה 0 בקובץ " + path_.string());
   // Read-only and without any lock: the host may hold the file open and write it.
-  fd_ = ::open(path.c_str(), O_RDONLY | O_CLOEXEC);
+  // Non-blocking, so that opening a FIFO put in a file's place returns at once; it is then
+  // refused below. Regular files ignore the flag.
+  fd_ = ::open(path.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
   if (fd_ < 0) {
     int err = errno;
     if (err == ENOENT) throw HostFileError("הקובץ " + path_.string() + " לא נמצא");
@@ -111,6 +115,11 @@ void HostRecordFile::OpenPath(const std::filesystem::path& path) {
     ::close(fd_);
     fd_ = -1;
     throw HostFileError("הנתיב " + path_.string() + " הוא תיקייה ולא קובץ");
+  }
+  if (!S_ISREG(st.st_mode)) {
+    ::close(fd_);
+    fd_ = -1;
+    throw HostFileError("לא ניתן לקרוא את הקובץ " + path_.string() + ": אינו קובץ רגיל");
   }
   size_ = static_cast<uint64_t>(st.st_size);
 }

@@ -24,7 +24,8 @@ class HostFileError : public std::runtime_error {
 // Looks up the file `name` in `folder` without regard to ASCII case ("ACT.fix", "ACT.FIX" and
 // "act.fix" are the same file). An exact match wins; otherwise, of the entries whose names
 // match case-insensitively, the one that sorts first by bytes (so the choice does not depend
-// on the directory's listing order). Folders are never matched. A leading "\" or "/" on
+// on the directory's listing order). Only regular files (or links to them) are matched, never
+// folders, FIFOs or devices. A leading "\" or "/" on
 // `name` (the host's "\ACT.fix" form) is ignored. Returns nothing when there is no such file
 // or the folder cannot be listed.
 std::optional<std::filesystem::path> FindFileNoCase(const std::filesystem::path& folder,
@@ -34,7 +35,8 @@ class HostRecordFile {
  public:
   // Opens `folder`/`name` (name found by FindFileNoCase) for reading records of
   // `recordLength` bytes (at least 1). Throws HostFileError with a message naming the file
-  // when it is missing or cannot be read. The length is taken once, at opening.
+  // when it is missing, cannot be read or is not a regular file (a FIFO is refused at once,
+  // never waited on). The length is taken once, at opening.
   HostRecordFile(const std::filesystem::path& folder, std::string_view name, size_t recordLength);
   // Opens an exact path.
   HostRecordFile(const std::filesystem::path& path, size_t recordLength);

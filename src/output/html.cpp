@@ -1,5 +1,9 @@
 // Pieces the three outputs share: the Windows-1255 output file, value texts, page escaping,
 // the sheet geometry and the head of both pages.
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
 #include <array>
 #include <cerrno>
 #include <chrono>
@@ -40,17 +44,24 @@ constexpr std::string_view kSavedFromUrl = "http://www.vornak.co.il/";
 }  // namespace
 
 CodePageFile::CodePageFile(const std::string& path, Unmappable mode) : path_(path), mode_(mode) {
-  std::error_code ec;
-  const std::filesystem::path p(path);
-  if (std::filesystem::exists(p, ec)) {
-    std::filesystem::remove(p, ec);
-    if (ec) {
-      throw OutputError("לא ניתן למחוק את הקובץ הקודם " + path + ": " + ec.message());
+  // The temporary folder may be shared: a link planted at the path is removed, never
+  // followed, and the new file is created exclusively, so no link put there meanwhile is
+  // followed either.
+  struct stat st {};
+  if (::lstat(path.c_str(), &st) == 0) {
+    if (S_ISDIR(st.st_mode)) {
+      throw OutputError("לא ניתן ליצור את הקובץ " + path + ": קיימת תיקייה בשם זה");
+    }
+    if (::unlink(path.c_str()) != 0) {
+      throw OutputError("לא ניתן למחוק את הקובץ הקודם " + path + ": " + std::strerror(errno));
     }
   }
-  file_ = std::fopen(path.c_str(), "wb");
+  const int fd = ::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0666);
+  if (fd >= 0) file_ = ::fdopen(fd, "wb");
   if (file_ == nullptr) {
-    throw OutputError("לא ניתן ליצור את הקובץ " + path + ": " + std::strerror(errno));
+    const int err = errno;
+    if (fd >= 0) ::close(fd);
+    throw OutputError("לא ניתן ליצור את הקובץ " + path + ": " + std::strerror(err));
   }
   buf_.reserve(kFlushAt + 4096);
   BmpToWin1255();

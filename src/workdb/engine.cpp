@@ -2,6 +2,12 @@
 
 #include <sqlite3.h>
 
+#ifndef _WIN32
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+#endif
+
 #include <algorithm>
 #include <charconv>
 #include <cmath>
@@ -625,6 +631,29 @@ std::shared_ptr<Connection> OpenConnection(const fs::path& path, int flags) {
   return conn;
 }
 
+// The databases hold customers' names and addresses and live in a temporary folder that may
+// be shared: the file is made here, exclusively, readable by its owner only and never
+// through a link, before the engine opens it (the engine gives its journals the same mode).
+void CreatePrivateFile(const fs::path& path) {
+#ifndef _WIN32
+  const int fd = ::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0600);
+  if (fd < 0) {
+    const int err = errno;
+    throw EngineError(err == EEXIST ? kErrFileExists : kErrCannotOpen,
+                      "לא ניתן ליצור את קובץ מסד הנתונים '" + PathText(path) +
+                          "': " + std::generic_category().message(err));
+  }
+  ::close(fd);
+#else
+  (void)path;
+#endif
+}
+
+bool IsLink(const fs::path& path) {
+  std::error_code ec;
+  return fs::is_symlink(fs::symlink_status(path, ec));
+}
+
 }  // namespace
 
 Database Database::Create(const fs::path& path, std::string_view locale, Durability durability) {
@@ -638,6 +667,7 @@ Database Database::Create(const fs::path& path, std::string_view locale, Durabil
     companion += suffix;
     fs::remove(companion, ec);
   }
+  CreatePrivateFile(path);
   auto impl = std::make_unique<Impl>();
   impl->path = path;
   impl->conn = OpenConnection(path, SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE);
@@ -671,6 +701,10 @@ Database Database::Open(const fs::path& path) {
   std::error_code ec;
   if (!fs::is_regular_file(path, ec)) {
     throw EngineError(kErrCannotOpen, "לא נמצא קובץ מסד הנתונים '" + PathText(path) + "'.");
+  }
+  if (IsLink(path)) {
+    throw EngineError(kErrCannotOpen,
+                      "קובץ מסד הנתונים '" + PathText(path) + "' הוא קישור סמלי; הוא לא נפתח.");
   }
   auto impl = std::make_unique<Impl>();
   impl->path = path;
