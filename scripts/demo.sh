@@ -13,7 +13,7 @@ mkdir -p "$out"
 out="$(cd "$out" && pwd)"
 company="$sample/company1"
 settings="$out/demo-settings.ini"
-rm -f "$settings"
+: > "$settings"  # an empty store: the defaults
 lines=()
 for i in 0 1 2 3 4 5 6 7 8; do lines+=(--set "UseTitle$i=1"); done
 zdrlab="$build/src/zdrlab"

@@ -1,9 +1,13 @@
 #include "app/cli.h"
 
+#include <charconv>
 #include <cstdio>
+#include <filesystem>
+#include <fstream>
 #include <iostream>
 #include <memory>
 #include <optional>
+#include <stdexcept>
 #include <string>
 #include <utility>
 #include <vector>
@@ -19,6 +23,7 @@ namespace {
 const char* const kUsage =
     "usage: zdrlab labels|list|post [--company DIR] [--settings FILE] [--set NAME=VALUE]... "
     "[--open]\n"
+    "  (each option's value may also follow an equals sign: --set=NAME=VALUE)\n"
     "  labels  the label sheet zdrlab1.htm\n"
     "  list    the address list zdrlab2.htm\n"
     "  post    the dispatch file zdpost1.csv and its workbook (FilePath)\n"
@@ -27,6 +32,37 @@ const char* const kUsage =
     "txtToRef, ChkByItems, txtFromItmKey, txtToItmKey, txtFromItmSort, txtToItmSort, "
     "txtStartFrom.\n";
 
+// Settings whose control takes only some whole numbers: a value the control could not hold
+// is refused here, before anything runs, instead of being dropped or reaching the output.
+struct NumberCheck {
+  const char* name;
+  long low;
+  long high;
+  const char* allowed;  // shown when a value is refused
+};
+constexpr NumberCheck kNumberChecks[] = {
+    {"FileFormat", 0, 1, "0 (דואר ישראל) או 1 (הובלות עם שחר)"},
+    {"OpenExcel", 0, 1, "0 או 1"},
+    {"ChkByItems", 0, 2, "0, 1 או 2"},
+};
+
+// The value of NAME=VALUE as the control would take it: unchanged for free text, the whole
+// number in decimal for a checked setting. Throws std::runtime_error for a refused value.
+std::string CheckedValue(const std::string& name, const std::string& value) {
+  for (const NumberCheck& check : kNumberChecks) {
+    if (name != check.name) continue;
+    long number = 0;
+    const char* end = value.data() + value.size();
+    const auto [at, ec] = std::from_chars(value.data(), end, number);
+    if (value.empty() || ec != std::errc() || at != end || number < check.low ||
+        number > check.high) {
+      throw std::runtime_error(name + ": ערך לא חוקי \"" + value + "\" (" + check.allowed + ")");
+    }
+    return std::to_string(number);
+  }
+  return value;
+}
+
 // Panel controls whose values the settings store does not keep.
 bool SetUnstoredControl(Panel& p, const std::string& name, const std::string& value) {
   if (name == "txtFromRef") {
@@ -34,9 +70,7 @@ bool SetUnstoredControl(Panel& p, const std::string& name, const std::string& va
   } else if (name == "txtToRef") {
     p.txtToRef = value;
   } else if (name == "ChkByItems") {
-    if (value != "0" && value != "1" && value != "2")
-      throw std::runtime_error("ChkByItems: ערך לא חוקי \"" + value + "\" (0, 1 או 2)");
-    p.ChkByItems = value[0] - '0';
+    p.ChkByItems = std::stoi(value);  // checked by CheckedValue
   } else if (name == "txtFromItmKey") {
     p.txtFromItmKey = value;
   } else if (name == "txtToItmKey") {
@@ -53,10 +87,26 @@ bool SetUnstoredControl(Panel& p, const std::string& name, const std::string& va
   return true;
 }
 
+// Why the settings file cannot be used, or "" when it can be read.
+std::string SettingsFileProblem(const std::string& file) {
+  namespace fs = std::filesystem;
+  const fs::path path(std::u8string(file.begin(), file.end()));
+  std::error_code ec;
+  const fs::file_status st = fs::status(path, ec);
+  if (!fs::exists(st)) return "קובץ ההגדרות " + file + " לא נמצא";
+  if (fs::is_directory(st)) return "קובץ ההגדרות " + file + " הוא תיקייה ולא קובץ";
+  if (!fs::is_regular_file(st)) return "קובץ ההגדרות " + file + " אינו קובץ רגיל";
+  std::ifstream in(path, std::ios::binary);
+  char probe;
+  if (!in || (!in.get(probe) && !in.eof())) return "לא ניתן לקרוא את קובץ ההגדרות " + file;
+  return "";
+}
+
 // Applies NAME=VALUE through the store's own routines: the current values are saved into a
 // scratch store, the one key is replaced there, and everything is loaded back, so a value
 // takes exactly the checks and conversions a stored one would.
-void ApplySet(Control& control, const std::string& name, const std::string& value) {
+void ApplySet(Control& control, const std::string& name, const std::string& typed) {
+  const std::string value = CheckedValue(name, typed);
   if (SetUnstoredControl(control.panel(), name, value)) return;
   if (name == "ConnDataBase") {
     control.state().companyPath = value;
@@ -96,8 +146,15 @@ int RunCli(const std::vector<std::string>& args, SettingsStore& defaultStore) {
   std::vector<std::pair<std::string, std::string>> sets;
   bool open = false;
   for (size_t i = 1; i < args.size(); ++i) {
-    const std::string& a = args[i];
-    auto needValue = [&](const char* opt) -> const std::string& {
+    // "--name=value" is "--name value".
+    std::string a = args[i];
+    std::optional<std::string> inlineValue;
+    if (const auto eq = a.find('='); a.rfind("--", 0) == 0 && eq != std::string::npos) {
+      inlineValue = a.substr(eq + 1);
+      a.resize(eq);
+    }
+    auto needValue = [&](const char* opt) -> std::string {
+      if (inlineValue) return *inlineValue;
       if (i + 1 >= args.size()) {
         throw std::invalid_argument(std::string(opt) + " needs a value");
       }
@@ -109,12 +166,12 @@ int RunCli(const std::vector<std::string>& args, SettingsStore& defaultStore) {
       } else if (a == "--settings") {
         settingsFile = needValue("--settings");
       } else if (a == "--set") {
-        const std::string& kv = needValue("--set");
+        const std::string kv = needValue("--set");
         const auto eq = kv.find('=');
         if (eq == std::string::npos || eq == 0)
           throw std::invalid_argument("--set takes NAME=VALUE, not " + kv);
         sets.emplace_back(kv.substr(0, eq), kv.substr(eq + 1));
-      } else if (a == "--open") {
+      } else if (a == "--open" && !inlineValue) {
         open = true;
       } else {
         throw std::invalid_argument("unknown option " + a);
@@ -125,6 +182,13 @@ int RunCli(const std::vector<std::string>& args, SettingsStore& defaultStore) {
     }
   }
 
+  if (settingsFile) {
+    // A missing or unreadable file would silently give the default criteria.
+    if (const std::string problem = SettingsFileProblem(*settingsFile); !problem.empty()) {
+      std::fprintf(stderr, "zdrlab: %s\n", problem.c_str());
+      return 2;
+    }
+  }
   std::unique_ptr<SettingsStore> fileStore;
   if (settingsFile) fileStore = std::make_unique<QtSettingsStore>(*settingsFile);
   SettingsStore& store = fileStore ? *fileStore : defaultStore;

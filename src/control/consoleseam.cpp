@@ -1,16 +1,23 @@
 #include "control/consoleseam.h"
 
-#include <cstdlib>
+#include <chrono>
 #include <string>
+#include <thread>
 
 #ifdef _WIN32
 #include <io.h>
+#include <shellapi.h>
+#include <windows.h>
 #define ZDR_ISATTY _isatty
 #define ZDR_FILENO _fileno
 #else
+#include <fcntl.h>
+#include <spawn.h>
+#include <sys/wait.h>
 #include <unistd.h>
 #define ZDR_ISATTY isatty
 #define ZDR_FILENO fileno
+extern char** environ;
 #endif
 
 namespace zdr {
@@ -30,17 +37,6 @@ const char* IconWord(MsgIcon icon) {
   return "";
 }
 
-std::string ShellQuote(const std::string& s) {
-  std::string q = "'";
-  for (char c : s) {
-    if (c == '\'')
-      q += "'\\''";
-    else
-      q += c;
-  }
-  return q + "'";
-}
-
 }  // namespace
 
 ConsoleSeam::ConsoleSeam(std::FILE* err, bool openFiles)
@@ -56,11 +52,7 @@ void ConsoleSeam::EndProgressLine() {
 
 void ConsoleSeam::ShowMessage(std::string_view text, std::string_view title, MsgIcon icon) {
   EndProgressLine();
-  // A critical box, or a fault or error title (some importers report with the information
-  // icon), means the command did not do all it should.
-  if (icon == MsgIcon::Critical || title.rfind(kTitleFault, 0) == 0 ||
-      title.rfind(kTitleError, 0) == 0)
-    ++failures_;
+  if (IsFailureMessage(title, icon)) ++failures_;
   std::fprintf(err_, "[%s] %.*s: %.*s\n", IconWord(icon), static_cast<int>(title.size()),
                title.data(), static_cast<int>(text.size()), text.data());
   std::fflush(err_);
@@ -111,14 +103,45 @@ bool ConsoleSeam::OpenInSpreadsheet(const std::string& path) {
 }
 
 bool OpenWithDesktop(const std::string& path) {
-#if defined(_WIN32)
-  const std::string cmd = "start \"\" \"" + path + "\"";
-#elif defined(__APPLE__)
-  const std::string cmd = "open " + ShellQuote(path) + " >/dev/null 2>&1";
+#ifdef _WIN32
+  const INT_PTR rc = reinterpret_cast<INT_PTR>(
+      ShellExecuteA(nullptr, "open", path.c_str(), nullptr, nullptr, SW_SHOWNORMAL));
+  return rc > 32;
 #else
-  const std::string cmd = "xdg-open " + ShellQuote(path) + " >/dev/null 2>&1 &";
+#ifdef __APPLE__
+  const char* opener = "open";
+#else
+  const char* opener = "xdg-open";
 #endif
-  return std::system(cmd.c_str()) == 0;
+  // Started directly, not through a shell, so that a missing opener is seen. Its standard
+  // output is not ours: the command line prints the produced path there.
+  posix_spawn_file_actions_t actions;
+  posix_spawn_file_actions_init(&actions);
+  posix_spawn_file_actions_addopen(&actions, STDIN_FILENO, "/dev/null", O_RDONLY, 0);
+  posix_spawn_file_actions_addopen(&actions, STDOUT_FILENO, "/dev/null", O_WRONLY, 0);
+  std::string file = path;
+  char* argv[] = {const_cast<char*>(opener), file.data(), nullptr};
+  pid_t pid = 0;
+  const int spawned = posix_spawnp(&pid, opener, &actions, nullptr, argv, environ);
+  posix_spawn_file_actions_destroy(&actions);
+  if (spawned != 0) return false;
+  // The opener hands the file to the program for its type and ends; when it cannot, its exit
+  // status says so. One still running after a while (some desktops wait for the program to
+  // close) has started it.
+  const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(5);
+  while (std::chrono::steady_clock::now() < deadline) {
+    int status = 0;
+    const pid_t done = ::waitpid(pid, &status, WNOHANG);
+    if (done == pid) return WIFEXITED(status) && WEXITSTATUS(status) == 0;
+    if (done < 0) return false;
+    std::this_thread::sleep_for(std::chrono::milliseconds(20));
+  }
+  std::thread([pid] {
+    int status = 0;
+    ::waitpid(pid, &status, 0);
+  }).detach();
+  return true;
+#endif
 }
 
 }  // namespace zdr

@@ -36,7 +36,9 @@ class ConsoleSeam : public UserSeam {
   int failures_ = 0;
 };
 
-// Hands a file to the desktop's program for its type (xdg-open, open, or start).
+// Hands a file to the desktop's program for its type (xdg-open, open, or the shell's open
+// verb on Windows), started directly. Returns false when the opener cannot be started or
+// reports that it could not open the file.
 bool OpenWithDesktop(const std::string& path);
 
 }  // namespace zdr

@@ -1,6 +1,7 @@
 // The zdrlab command line end to end on a generated company: the files it writes, what it
 // prints, and its exit codes.
 #include <gtest/gtest.h>
+#include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -14,6 +15,7 @@
 #include <vector>
 
 #include "import/codepage.h"
+#include "workdb/worklock.h"
 #include "zdrgen/generator.h"
 
 namespace fs = std::filesystem;
@@ -60,24 +62,54 @@ class CliTest : public ::testing::Test {
     temp_ = root_ / ::testing::UnitTest::GetInstance()->current_test_info()->name();
     fs::create_directories(temp_);
     settings_ = temp_ / "settings.ini";
+    std::ofstream(settings_).flush();
   }
 
-  RunResult Run(const std::vector<std::string>& args) {
-    std::string cmd =
-        "Temp=" + Quote(temp_.string()) + " " + Quote(std::string(ZDR_BINARY_DIR) + "/src/zdrlab");
+  // A run started and not yet waited for.
+  struct Started {
+    FILE* pipe;
+    fs::path errFile;
+  };
+
+  // Starts zdrlab with `args`; `env` is put before the command as NAME=VALUE words (for
+  // `env -u NAME`, a leading "env -u NAME").
+  Started Start(const std::vector<std::string>& args, const std::string& env = "") {
+    static int runs = 0;
+    const fs::path errFile = temp_ / ("stderr" + std::to_string(++runs) + ".txt");
+    std::string cmd = env + " Temp=" + Quote(temp_.string()) + " " +
+                      Quote(std::string(ZDR_BINARY_DIR) + "/src/zdrlab");
     for (const auto& a : args) cmd += " " + Quote(a);
-    const fs::path errFile = temp_ / "stderr.txt";
     cmd += " 2>" + Quote(errFile.string());
-    RunResult r;
     FILE* pipe = ::popen(cmd.c_str(), "r");
     EXPECT_NE(pipe, nullptr);
+    return {pipe, errFile};
+  }
+
+  static RunResult Finish(Started s) {
+    RunResult r;
     std::array<char, 4096> buf;
     size_t n;
-    while ((n = std::fread(buf.data(), 1, buf.size(), pipe)) > 0) r.out.append(buf.data(), n);
-    const int status = ::pclose(pipe);
+    while ((n = std::fread(buf.data(), 1, buf.size(), s.pipe)) > 0) r.out.append(buf.data(), n);
+    const int status = ::pclose(s.pipe);
     r.exitCode = WIFEXITED(status) ? WEXITSTATUS(status) : -1;
-    r.err = ReadFile(errFile);
+    r.err = ReadFile(s.errFile);
     return r;
+  }
+
+  RunResult Run(const std::vector<std::string>& args, const std::string& env = "") {
+    return Finish(Start(args, env));
+  }
+
+  // A folder holding a stand-in for the desktop's opener: it copies the file it is given to
+  // $COPY_TO, or fails with `exitCode`.
+  fs::path FakeOpener(int exitCode = 0) {
+    const fs::path bin = temp_ / ("bin" + std::to_string(exitCode));
+    fs::create_directories(bin);
+    std::ofstream(bin / "xdg-open")
+        << "#!/bin/sh\n"
+        << (exitCode == 0 ? "/bin/cp \"$1\" \"$COPY_TO\"\n" : "") << "exit " << exitCode << "\n";
+    fs::permissions(bin / "xdg-open", fs::perms::owner_all);
+    return bin;
   }
 
   std::vector<std::string> Base(const std::string& command) {
@@ -299,6 +331,286 @@ TEST_F(CliTest, DocumentAddressOnTheSheetWasReversed) {
     EXPECT_EQ(onSheet, inList);
     EXPECT_EQ(onSheet, inFile);
   }
+}
+
+// --- Runs sharing a temporary folder ---
+
+const std::string kBusy = "תפוסים בידי הפעלה אחרת של התוכנה";
+
+TEST_F(CliTest, RunWaitingOnAHeldTempFolderTouchedTheOtherRunsFiles) {
+  std::ofstream(temp_ / "zdrlab.DB") << "the other run's database";
+  zdr::WorkFilesLock held(temp_);
+  const RunResult r = Run(Base("labels"));
+  EXPECT_EQ(r.exitCode, 1);
+  EXPECT_NE(r.err.find(kBusy), std::string::npos) << r.err;
+  EXPECT_EQ(r.err.find("מאתחל בסיס נתונים"), std::string::npos) << "no data load";
+  EXPECT_EQ(ReadFile(temp_ / "zdrlab.DB"), "the other run's database");
+  EXPECT_FALSE(fs::exists(temp_ / "zdrlab1.htm"));
+}
+
+// Two companies listed at once in one temporary folder: each run gives exactly the page it
+// gives alone, or is refused with the message; never a page mixed from both companies.
+TEST_F(CliTest, TwoRunsSharingATempFolderMixedTheirCompanies) {
+  zdrgen::Options options;
+  options.accounts = 4000;
+  options.documents = 0;
+  options.ledger = 30000;
+  options.keepDetail = false;
+  const fs::path companies[2] = {temp_ / "a", temp_ / "b"};
+  for (int c = 0; c < 2; ++c) {
+    options.seed = 31 + c;
+    zdrgen::WriteCompany(companies[c], options, c == 0 ? "חברה א" : "חברה ב");
+  }
+  const fs::path bin = FakeOpener();
+  auto args = [&](int c) {
+    return std::vector<std::string>{"list",
+                                    "--company",
+                                    companies[c].string(),
+                                    "--settings",
+                                    settings_.string(),
+                                    "--set",
+                                    "UseTransType=1",
+                                    "--set",
+                                    "TransType=*",
+                                    "--open"};
+  };
+  auto env = [&](const fs::path& copy) {
+    return "PATH=" + Quote(bin.string()) + " COPY_TO=" + Quote(copy.string());
+  };
+  std::string solo[2];
+  for (int c = 0; c < 2; ++c) {
+    const fs::path copy = temp_ / ("solo" + std::to_string(c));
+    ASSERT_EQ(Run(args(c), env(copy)).exitCode, 0);
+    solo[c] = ReadFile(copy);
+    ASSERT_FALSE(solo[c].empty());
+  }
+  ASSERT_NE(solo[0], solo[1]);
+  int refused = 0;
+  for (int round = 0; round < 2; ++round) {
+    fs::path copies[2];
+    Started runs[2];
+    for (int c = 0; c < 2; ++c) {
+      copies[c] = temp_ / ("run" + std::to_string(round) + std::to_string(c));
+      runs[c] = Start(args(c), env(copies[c]));
+    }
+    for (int c = 0; c < 2; ++c) {
+      const RunResult r = Finish(runs[c]);
+      if (r.exitCode == 0) {
+        EXPECT_TRUE(ReadFile(copies[c]) == solo[c]) << "company " << c << " round " << round;
+      } else {
+        ++refused;
+        EXPECT_EQ(r.exitCode, 1);
+        EXPECT_NE(r.err.find(kBusy), std::string::npos) << r.err;
+        EXPECT_FALSE(fs::exists(copies[c]));
+      }
+    }
+  }
+  RecordProperty("refused", refused);
+}
+
+// --- The dispatch target ---
+
+struct BadTarget {
+  const char* fault;
+  std::string (*path)(const fs::path& temp, const fs::path& company);
+  const char* message;
+};
+
+TEST_F(CliTest, PostDeletedTheTargetBeforeCheckingIt) {
+  // A copy of the company, so its host files can be compared before and after.
+  const fs::path company = temp_ / "company";
+  fs::copy(root_ / "company", company);
+  fs::create_directories(temp_ / "empty folder");
+  std::ofstream(temp_ / "old.xls") << "old workbook";
+  std::ofstream(temp_ / "notes.txt") << "old notes";
+  fs::create_symlink(company / "ACT.fix", temp_ / "link.xlsx");
+  const BadTarget cases[] = {
+      {"host account file",
+       [](const fs::path&, const fs::path& c) { return (c / "ACT.fix").string(); },
+       "נמצא בתיקיית החברה"},
+      {"workbook inside the company folder",
+       [](const fs::path&, const fs::path& c) { return (c / "out.xlsx").string(); },
+       "נמצא בתיקיית החברה"},
+      {"link to a host file",
+       [](const fs::path& t, const fs::path&) { return (t / "link.xlsx").string(); },
+       "נמצא בתיקיית החברה"},
+      {"host file name elsewhere",
+       [](const fs::path& t, const fs::path&) { return (t / "amv.fix").string(); },
+       "קובץ הנהלת חשבונות"},
+      {"folder", [](const fs::path& t, const fs::path&) { return (t / "empty folder").string(); },
+       "הוא תיקייה"},
+      {"xls without a converter",
+       [](const fs::path& t, const fs::path&) { return (t / "old.xls").string(); },
+       "לא נמצאה תוכנה שממירה"},
+      {"text file", [](const fs::path& t, const fs::path&) { return (t / "notes.txt").string(); },
+       "לא ניתן לכתוב גיליון עבודה"},
+      {"no extension", [](const fs::path& t, const fs::path&) { return (t / "book").string(); },
+       "אין סיומת"},
+      {"missing folder",
+       [](const fs::path& t, const fs::path&) { return (t / "nowhere" / "book.xlsx").string(); },
+       "לא נמצאה"},
+  };
+  std::vector<std::pair<fs::path, std::string>> before;
+  for (const auto& e : fs::directory_iterator(company))
+    before.emplace_back(e.path(), ReadFile(e.path()));
+  for (const BadTarget& c : cases) {
+    SCOPED_TRACE(c.fault);
+    const std::string target = c.path(temp_, company);
+    const std::string oldBytes = fs::is_regular_file(target) ? ReadFile(target) : "";
+    const bool existed = fs::exists(fs::symlink_status(target));
+    auto args = Base("post");
+    args[2] = company.string();
+    args.insert(args.end(), {"--set", "FilePath=" + target});
+    const RunResult r = Run(args, "PATH=" + Quote((temp_ / "no programs").string()));
+    EXPECT_EQ(r.exitCode, 1);
+    EXPECT_NE(r.err.find(c.message), std::string::npos) << r.err;
+    EXPECT_EQ(r.err.find("מאתחל בסיס נתונים"), std::string::npos) << "checked before the load";
+    EXPECT_EQ(fs::exists(fs::symlink_status(target)), existed);
+    if (fs::is_regular_file(target)) {
+      EXPECT_EQ(ReadFile(target), oldBytes);
+    }
+  }
+  EXPECT_TRUE(fs::is_directory(temp_ / "empty folder"));
+  EXPECT_TRUE(fs::is_symlink(temp_ / "link.xlsx"));
+  size_t still = 0;
+  for (const auto& e : fs::directory_iterator(company)) {
+    ++still;
+    for (const auto& [path, bytes] : before) {
+      if (path == e.path()) {
+        EXPECT_EQ(ReadFile(path), bytes) << path;
+      }
+    }
+  }
+  EXPECT_EQ(still, before.size());
+}
+
+TEST_F(CliTest, FailedPostLostTheOldWorkbook) {
+  const fs::path book = temp_ / "post.xlsx";
+  std::ofstream(book) << "last week's workbook";
+  auto args = Base("post");
+  args[2] = (temp_ / "no such company").string();
+  args.insert(args.end(), {"--set", "FilePath=" + book.string()});
+  const RunResult r = Run(args);
+  EXPECT_EQ(r.exitCode, 1);
+  EXPECT_NE(r.err.find("לא נכתב מחדש"), std::string::npos) << r.err;
+  EXPECT_TRUE(r.out.empty());
+  EXPECT_EQ(ReadFile(book), "last week's workbook");
+  for (const auto& e : fs::directory_iterator(temp_))
+    EXPECT_EQ(e.path().filename().string().find(".post.xlsx."), std::string::npos) << e.path();
+}
+
+// --- Files in the temporary folder ---
+
+TEST_F(CliTest, LinkPlantedInTempRedirectedTheOutput) {
+  const fs::path victim = temp_ / "victim";
+  std::ofstream(victim) << "not yours";
+  for (const char* name : {"zdrlab.DB", "zdrlab2.htm", "zdpost1.csv"}) {
+    fs::create_symlink(victim, temp_ / name);
+  }
+  const RunResult list = Run(Base("list"));
+  ASSERT_EQ(list.exitCode, 0) << list.err;
+  auto post = Base("post");
+  post.insert(post.end(), {"--set", "FilePath=" + (temp_ / "p.xlsx").string()});
+  const RunResult r = Run(post);
+  ASSERT_EQ(r.exitCode, 0) << r.err;
+  EXPECT_EQ(ReadFile(victim), "not yours");
+  for (const char* name : {"zdrlab.DB", "zdrlab2.htm", "zdpost1.csv"}) {
+    EXPECT_TRUE(fs::is_regular_file(fs::symlink_status(temp_ / name))) << name;
+  }
+}
+
+TEST_F(CliTest, WorkingDatabaseWasReadableByEveryone) {
+  ASSERT_EQ(Run(Base("labels")).exitCode, 0);
+  struct stat st {};
+  ASSERT_EQ(::stat((temp_ / "zdrlab.DB").c_str(), &st), 0);
+  EXPECT_EQ(st.st_mode & 0777, 0600u);
+}
+
+TEST_F(CliTest, FifoInPlaceOfTheAccountFileHungTheRun) {
+  const fs::path company = temp_ / "fifo company";
+  fs::create_directories(company);
+  ASSERT_EQ(::mkfifo((company / "ACT.fix").c_str(), 0600), 0);
+  auto args = Base("labels");
+  args[2] = company.string();
+  const RunResult r = Run(args, "timeout 30 env");
+  EXPECT_EQ(r.exitCode, 1);
+  EXPECT_NE(r.err.find("ACT.fix"), std::string::npos) << r.err;
+  EXPECT_NE(r.err.find("לא נמצא"), std::string::npos) << r.err;
+}
+
+// --- The command line's own checks ---
+
+TEST_F(CliTest, SettingsFileThatCannotBeReadGaveTheDefaultsSilently) {
+  fs::create_directories(temp_ / "a folder");
+  std::ofstream(temp_ / "locked.ini") << "[Params]\n";
+  fs::permissions(temp_ / "locked.ini", fs::perms::none);
+  const std::pair<fs::path, const char*> cases[] = {
+      {temp_ / "missing.ini", "לא נמצא"},
+      {temp_ / "a folder", "הוא תיקייה"},
+      {temp_ / "locked.ini", "לא ניתן לקרוא"},
+  };
+  for (const auto& [file, message] : cases) {
+    if (file.filename() == "locked.ini" && ::geteuid() == 0) continue;  // root reads it
+    const RunResult r =
+        Run({"labels", "--company", (root_ / "company").string(), "--settings", file.string()});
+    EXPECT_EQ(r.exitCode, 2) << file;
+    EXPECT_NE(r.err.find(message), std::string::npos) << r.err;
+    EXPECT_FALSE(fs::exists(temp_ / "zdrlab.DB"));
+  }
+}
+
+TEST_F(CliTest, DispatchValueThePanelRefusesWroteAnEmptyFile) {
+  const fs::path book = temp_ / "post.xlsx";
+  for (const char* set : {"FileFormat=2", "FileFormat=-1", "FileFormat=abc", "FileFormat=1.0",
+                          "FileFormat=", "OpenExcel=yes", "OpenExcel=3", "ChkByItems=x"}) {
+    auto args = Base("post");
+    args.insert(args.end(), {"--set", "FilePath=" + book.string(), "--set", set});
+    const RunResult r = Run(args);
+    EXPECT_EQ(r.exitCode, 2) << set;
+    EXPECT_NE(r.err.find("ערך לא חוקי"), std::string::npos) << set << r.err;
+    EXPECT_FALSE(fs::exists(book)) << set;
+  }
+}
+
+TEST_F(CliTest, EqualsFormOfAnOptionWasRefused) {
+  const fs::path book = temp_ / "post.xlsx";
+  const RunResult r =
+      Run({"post", "--company=" + (root_ / "company").string(), "--settings=" + settings_.string(),
+           "--set=FilePath=" + book.string(), "--set=FileFormat=1"});
+  ASSERT_EQ(r.exitCode, 0) << r.err;
+  EXPECT_EQ(r.out, book.string() + "\n");
+  const std::string csv = zdr::Win1255ToUtf8(ReadFile(temp_ / "zdpost1.csv"));
+  EXPECT_EQ(csv.rfind("קוד לקוח,", 0), 0u);
+  EXPECT_EQ(Run({"labels", "--open=yes"}).exitCode, 2);
+}
+
+TEST_F(CliTest, OpenReportedSuccessWhenNoProgramStarted) {
+  const fs::path none = temp_ / "no programs";
+  fs::create_directories(none);
+  const std::string failing = FakeOpener(3).string();
+  for (const std::string& path : {none.string(), failing}) {
+    auto args = Base("labels");
+    args.push_back("--open");
+    const RunResult r = Run(args, "PATH=" + Quote(path));
+    EXPECT_EQ(r.exitCode, 1) << path;
+    EXPECT_NE(r.err.find("לא ניתן לפתוח"), std::string::npos) << r.err;
+    EXPECT_TRUE(r.out.empty());
+  }
+  auto args = Base("labels");
+  args.push_back("--open");
+  const RunResult r = Run(args, "PATH=" + Quote(FakeOpener().string()) +
+                                    " COPY_TO=" + Quote((temp_ / "seen").string()));
+  EXPECT_EQ(r.exitCode, 0) << r.err;
+  EXPECT_EQ(ReadFile(temp_ / "seen"), ReadFile(temp_ / "zdrlab1.htm"));
+}
+
+TEST_F(CliTest, NoCommandWithoutADisplayAborted) {
+  const RunResult r = Run({}, "env -u DISPLAY -u WAYLAND_DISPLAY -u QT_QPA_PLATFORM");
+  if (r.exitCode == 2 && r.err.find("without its window") != std::string::npos) {
+    GTEST_SKIP() << "built without the window";
+  }
+  EXPECT_EQ(r.exitCode, 1) << r.err;
+  EXPECT_NE(r.err.find("DISPLAY"), std::string::npos) << r.err;
 }
 
 }  // namespace
