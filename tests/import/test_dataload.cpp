@@ -3,6 +3,9 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
+#include <fstream>
+#include <iterator>
 #include <set>
 #include <string>
 #include <vector>
@@ -12,6 +15,7 @@
 #include "control/panel.h"
 #include "import/doctypes.h"
 #include "importtest.h"
+#include "output/output.h"
 #include "zdrgen/generator.h"
 
 namespace zdr {
@@ -236,6 +240,63 @@ TEST_F(DataLoad, GeneratedCompanyRowsMatchWhatWasWritten) {
     for (const auto& t : b.transactions) transacts += distinctKeys(t.accountIndex);
   }
   EXPECT_EQ(Rows("tTransact"), transacts);
+}
+
+// The dispatch load (not as-is) converts the keys of the ledger, the batches and the cash
+// receipts as it converts the account keys. Were they converted otherwise, digit keys would
+// miss their accounts and the payers would drop out of the dispatch file.
+TEST_F(DataLoad, DispatchLoadLostPayersWhoseKeysConvertDifferently) {
+  zdrgen::Options options;
+  const zdrgen::CompanyTruth truth =
+      zdrgen::WriteCompany(root_ / "generated", options, "חברה לדוגמה");
+  state_.companyPath = truth.folder.string();
+  struct Source {
+    const char* table;
+    void (*criterion)(Panel&);
+  };
+  const Source sources[] = {
+      {"tTransact",
+       [](Panel& p) {
+         p.chkTransType = 1;
+         p.txtTransType = "*";
+         p.chkReadTempTrans = 1;
+       }},
+      {"tCash",
+       [](Panel& p) {
+         p.ChkDates = 1;
+         p.cmbDocType = kCashReceiptsRow;
+       }},
+  };
+  for (const Source& source : sources) {
+    SCOPED_TRACE(source.table);
+    panel_ = Panel();
+    source.criterion(panel_);
+    Load(false);
+    ASSERT_TRUE(seam_.messages.empty()) << seam_.messages[0].text;
+    const std::string table = source.table;
+    const Strings payers =
+        ImportTest::Rows(state_.workDbPath, "SELECT DISTINCT AccountKey FROM " + table);
+    ASSERT_GT(payers.size(), 10u);
+    EXPECT_EQ(ImportTest::Rows(state_.workDbPath,
+                               "SELECT AccountKey FROM " + table +
+                                   " WHERE AccountKey Not In (SELECT AccountKey FROM tAccount)"),
+              Strings{});
+
+    // The courier layout starts each line with the account key.
+    const std::string csv = (root_ / "temp" / "zdpost1.csv").string();
+    CreateCSV(csv, state_.workDbPath, 1, panel_, docTypes_, "", PostILSettings(), seam_);
+    std::ifstream in(csv, std::ios::binary);
+    const std::string text = Win1255ToUtf8(std::string(std::istreambuf_iterator<char>(in), {}));
+    std::set<std::string> listed;
+    for (size_t at = text.find("\r\n"); at != std::string::npos && at + 2 < text.size();
+         at = text.find("\r\n", at + 2)) {
+      listed.insert(text.substr(at + 2, text.find(',', at + 2) - at - 2));
+    }
+    for (std::string key : payers) {
+      std::replace(key.begin(), key.end(), ',', ' ');
+      EXPECT_TRUE(listed.count(key)) << key;
+    }
+  }
 }
 
 }  // namespace

@@ -1,5 +1,8 @@
 // The label sheet, its value helpers and the sheet geometry.
 #include <gtest/gtest.h>
+#include <sys/resource.h>
+
+#include <csignal>
 
 #include "output/outputtest.h"
 
@@ -87,6 +90,23 @@ class LabelSheetTest : public OutputTest {
     panel.ChkTitle[1] = 1;
   }
 };
+
+// The disk takes only part of the page (here a file size limit): the writer fails, so the
+// command never reports the page as done.
+TEST_F(LabelSheetTest, PageCutShortByTheDiskIsAnError) {
+  const std::string db = BuildDb(NumberedAccounts(300));
+  rlimit old{};
+  ASSERT_EQ(::getrlimit(RLIMIT_FSIZE, &old), 0);
+  rlimit small = old;
+  small.rlim_cur = 16 * 1024;
+  const auto oldHandler = std::signal(SIGXFSZ, SIG_IGN);
+  ASSERT_EQ(::setrlimit(RLIMIT_FSIZE, &small), 0);
+  EXPECT_THROW(CreateLabFile(PathOf("zdrlab1.htm"), db, panel, docTypes, "", labels, seam),
+               OutputError);
+  ::setrlimit(RLIMIT_FSIZE, &old);
+  std::signal(SIGXFSZ, oldHandler);
+  EXPECT_LE(std::filesystem::file_size(PathOf("zdrlab1.htm")), 16u * 1024);
+}
 
 TEST_F(LabelSheetTest, NoRecipientsStopsAfterBody) {
   labels.LabelDefs[1] = {0, 12, 2, 0, 0};
