@@ -331,6 +331,9 @@ void CheckWorkbookTarget(const std::string& pXlsFile, const std::string& company
   if (!fs::is_directory(resolved.parent_path(), ec)) {
     throw OutputError("התיקייה של קובץ הפלט " + pXlsFile + " לא נמצאה");
   }
+  if (::access(resolved.parent_path().c_str(), W_OK | X_OK) != 0) {
+    throw OutputError("אין הרשאה לכתוב בתיקייה של קובץ הפלט " + pXlsFile);
+  }
 }
 
 void ConvertToExcel(const std::string& pCsvFile, const std::string& pXlsFile, bool pOpenExcel,

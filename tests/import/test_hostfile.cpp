@@ -1,6 +1,7 @@
 #include "import/hostfile.h"
 
 #include <gtest/gtest.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cmath>
@@ -254,6 +255,10 @@ TEST_F(HostFileTest, MissingOrUnreadableFilesRaiseHostFileError) {
   EXPECT_THROW(HostRecordFile(dir_, "ITM.fix", 500), HostFileError);
   EXPECT_THROW(HostRecordFile(dir_ / "ITM.fix", 500), HostFileError);
   EXPECT_THROW(HostRecordFile(dir_, 650), HostFileError);  // a folder
+  // A FIFO in a file's place is refused at once, never waited on.
+  ASSERT_EQ(::mkfifo((dir_ / "ACT.fix").c_str(), 0600), 0);
+  EXPECT_FALSE(FindFileNoCase(dir_, "ACT.fix"));
+  EXPECT_THROW(HostRecordFile(dir_ / "ACT.fix", 650), HostFileError);
   Write("zero.fix", "abc");
   EXPECT_THROW(HostRecordFile(dir_, "zero.fix", 0), HostFileError);
   if (::geteuid() != 0) {  // root reads whatever the permissions say
