@@ -223,8 +223,10 @@ bool IsHostFileName(const fs::path& p) {
 class PendingFile {
  public:
   explicit PendingFile(const fs::path& target) : target_(target) {
-    std::string pattern =
-        (target.parent_path() / ("." + target.filename().string() + ".XXXXXX")).string();
+    std::string name = ".";
+    name += target.filename().string();
+    name += ".XXXXXX";
+    std::string pattern = (target.parent_path() / name).string();
     const int fd = ::mkstemp(pattern.data());
     if (fd < 0) {
       throw OutputError("לא ניתן ליצור קובץ בתיקייה של " + target.string() + ": " +
