@@ -140,6 +140,10 @@ char32_t Win1255ToCodePoint(unsigned char b) {
   return Win1255At(b);
 }
 
+bool IsWin1255Defined(unsigned char b) {
+  return b < 0x80 || kWin1255High[b - 0x80] != 0;
+}
+
 int CodePointToWin1255(char32_t cp) {
   if (cp < 0x80) return static_cast<int>(cp);
   // Bytes whose code point is the byte's own value: the undefined ones and most of

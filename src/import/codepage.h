@@ -21,6 +21,10 @@ char32_t Win1255ToCodePoint(unsigned char b);
 // The byte of a code point, or -1 when Windows-1255 cannot hold it.
 int CodePointToWin1255(char32_t cp);
 
+// False for the bytes Windows-1255 leaves undefined (0x81, 0x8A, 0xD9, ...): a file can
+// hold them, but no reader of the code page shows them as a character.
+bool IsWin1255Defined(unsigned char b);
+
 // Appends the UTF-8 form of Windows-1255 bytes to `out` (no allocation when `out` has room).
 void AppendWin1255AsUtf8(std::string_view bytes, std::string& out);
 std::string Win1255ToUtf8(std::string_view bytes);

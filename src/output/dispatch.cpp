@@ -84,13 +84,13 @@ void AppendPostRow(const db::Snapshot& rs, const DispatchFields& c, const std::s
                    const std::string& weight, const std::string& confirm, std::string& line) {
   AppendPrintedNumber(rs.Field(c.reference), line);
   line += ',';
-  AppendCsvField(rs.Field(c.name), 25, line);
+  AppendCsvField(rs.Field(c.name), kPostLengths.name, line);
   line += ",,";
-  AppendCsvField(rs.Field(c.address), 40, line);
+  AppendCsvField(rs.Field(c.address), kPostLengths.address, line);
   line += ',';
-  AppendCsvField(rs.Field(c.city), 15, line);
+  AppendCsvField(rs.Field(c.city), kPostLengths.city, line);
   line += ',';
-  AppendCsvField(rs.Field(c.telephone), 11, line);
+  AppendCsvField(rs.Field(c.telephone), kPostLengths.telephone, line);
   line += ",,";
   line += service;
   line += ',';
@@ -98,7 +98,7 @@ void AppendPostRow(const db::Snapshot& rs, const DispatchFields& c, const std::s
   line += ",,";
   line += confirm;
   line += ",,,";
-  AppendCsvField(rs.Field(c.details), 100, line);
+  AppendCsvField(rs.Field(c.details), kPostLengths.remarks, line);
   line += ",1";
 }
 
@@ -108,19 +108,19 @@ void AppendCourierRow(const db::Snapshot& rs, const DispatchFields& c, const std
                       std::string& line) {
   AppendCsvField(rs.Field(c.key), 0, line);
   line += ',';
-  AppendCsvField(rs.Field(c.name), 0, line);
+  AppendCsvField(rs.Field(c.name), kCourierLengths.name, line);
   line += ',';
-  AppendCsvField(rs.Field(c.address), 0, line);
+  AppendCsvField(rs.Field(c.address), kCourierLengths.address, line);
   line += ",,";
-  AppendCsvField(rs.Field(c.city), 0, line);
+  AppendCsvField(rs.Field(c.city), kCourierLengths.city, line);
   line += ',';
-  AppendCsvField(rs.Field(c.telephone), 0, line);
+  AppendCsvField(rs.Field(c.telephone), kCourierLengths.telephone, line);
   line += ",,,";
   line += date;
   line += ",,";
   AppendPrintedNumber(rs.Field(c.reference), line);
   line += ",1,1,,,,";
-  AppendCsvField(rs.Field(c.details), 100, line);
+  AppendCsvField(rs.Field(c.details), kCourierLengths.remarks, line);
 }
 
 }  // namespace

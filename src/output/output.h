@@ -18,11 +18,13 @@
 #include <stdexcept>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "control/panel.h"
 #include "control/userseam.h"
 #include "import/doctypes.h"
 #include "output/outputdefs.h"
+#include "output/preflight.h"
 #include "workdb/value.h"
 
 namespace zdr {
@@ -71,6 +73,13 @@ void CreateCSV(const std::string& pFileName, const std::string& pDBFile, int16_t
                const Panel& panel, const DocTypeTable& docTypes, const std::string& selectDbPath,
                const PostILSettings& settings, UserSeam& ui, Date today = Today());
 
+// The lengths, in characters, the dispatch file cuts its text fields to; 0: not cut.
+struct DispatchLengths {
+  int name, address, city, telephone, remarks;
+};
+inline constexpr DispatchLengths kPostLengths{25, 40, 15, 11, 100};  // layout 0
+inline constexpr DispatchLengths kCourierLengths{0, 0, 0, 0, 100};   // layout 1
+
 // The dispatch file's two header lines (UTF-8).
 inline constexpr std::string_view kPostILHeader0 =
     "מספר,שם משפחה,שם פרטי,כתובת,יישוב,טלפון 1,טלפון 2,סוג שירות,משקל,כפולה,אישור מסירה,"
@@ -102,8 +111,16 @@ void CheckWorkbookTarget(const std::string& pXlsFile, const std::string& company
 // the workbook is written to a new file beside it and renamed over it only when complete,
 // so on any failure the old file stays as it was. With `pOpenExcel` the sheet reads right
 // to left and the workbook is handed to ui.OpenInSpreadsheet. Throws OutputError.
+//
+// When there are `findings`, the workbook gains a second sheet, "בדיקה", listing them under
+// kFindingHeadings, right to left, every cell text; the dispatch sheet is the same with or
+// without it. With `showFindings` the workbook opens on the findings sheet.
 void ConvertToExcel(const std::string& pCsvFile, const std::string& pXlsFile, bool pOpenExcel,
-                    UserSeam& ui, const std::string& companyPath = {});
+                    UserSeam& ui, const std::string& companyPath = {},
+                    const std::vector<Finding>& findings = {}, bool showFindings = false);
+
+// The findings sheet's name.
+inline constexpr std::string_view kFindingsSheetName = "בדיקה";
 
 // Pieces the writers share.
 namespace output_internal {

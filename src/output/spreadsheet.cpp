@@ -7,6 +7,7 @@
 #include <xlsxwriter.h>
 
 #include <algorithm>
+#include <array>
 #include <cctype>
 #include <cerrno>
 #include <cmath>
@@ -85,8 +86,42 @@ void Check(lxw_error err, const std::string& what) {
   }
 }
 
-void WriteXlsx(const std::vector<std::string>& lines, const std::string& xlsxPath,
-               bool rightToLeft) {
+// The findings sheet: the headings, then one row per finding, every cell text.
+lxw_error WriteFindingsSheet(lxw_workbook* wb, const std::vector<Finding>& findings, bool show) {
+  lxw_worksheet* ws = workbook_add_worksheet(wb, std::string(kFindingsSheetName).c_str());
+  if (ws == nullptr) return LXW_ERROR_MEMORY_MALLOC_FAILED;
+  worksheet_right_to_left(ws);
+  if (show) worksheet_activate(ws);
+  std::array<size_t, kFindingHeadings.size()> widths{};
+  for (size_t c = 0; c < widths.size(); ++c) widths[c] = Utf8Length(kFindingHeadings[c]);
+  for (const Finding& f : findings) {
+    const auto cells = FindingCells(f);
+    for (size_t c = 0; c < widths.size(); ++c) {
+      widths[c] = std::max(widths[c], Utf8Length(cells[c]));
+    }
+  }
+  for (size_t c = 0; c < widths.size(); ++c) {
+    const double width = std::clamp(static_cast<double>(widths[c]) * 1.1 + 2.0, 6.0, 80.0);
+    worksheet_set_column(ws, static_cast<lxw_col_t>(c), static_cast<lxw_col_t>(c), width, nullptr);
+  }
+  lxw_error err = LXW_NO_ERROR;
+  for (size_t c = 0; c < kFindingHeadings.size() && err == LXW_NO_ERROR; ++c) {
+    err = worksheet_write_string(ws, 0, static_cast<lxw_col_t>(c),
+                                 std::string(kFindingHeadings[c]).c_str(), nullptr);
+  }
+  for (size_t r = 0; r < findings.size() && err == LXW_NO_ERROR; ++r) {
+    const auto cells = FindingCells(findings[r]);
+    for (size_t c = 0; c < cells.size() && err == LXW_NO_ERROR; ++c) {
+      if (cells[c].empty()) continue;
+      err = worksheet_write_string(ws, static_cast<lxw_row_t>(r + 1), static_cast<lxw_col_t>(c),
+                                   cells[c].c_str(), nullptr);
+    }
+  }
+  return err;
+}
+
+void WriteXlsx(const std::vector<std::string>& lines, const std::string& xlsxPath, bool rightToLeft,
+               const std::vector<Finding>& findings, bool showFindings) {
   // The reference column is numeric; which column it is depends on the layout.
   int numericCol = -1;
   if (!lines.empty()) {
@@ -132,6 +167,9 @@ void WriteXlsx(const std::vector<std::string>& lines, const std::string& xlsxPat
         err = worksheet_write_string(ws, row, col, cell.c_str(), nullptr);
       }
     }
+  }
+  if (err == LXW_NO_ERROR && !findings.empty()) {
+    err = WriteFindingsSheet(wb, findings, showFindings);
   }
   const lxw_error closed = workbook_close(wb);
   Check(err, xlsxPath);
@@ -265,7 +303,8 @@ class PendingFile {
 };
 
 void ConvertWithOffice(const std::vector<std::string>& lines, const fs::path& target,
-                       const fs::path& into, bool rightToLeft) {
+                       const fs::path& into, bool rightToLeft, const std::vector<Finding>& findings,
+                       bool showFindings) {
   const std::string office = FindOffice();
   if (office.empty()) {
     throw OutputError("לא נמצאה תוכנה שממירה לתבנית " + target.extension().string() +
@@ -285,7 +324,7 @@ void ConvertWithOffice(const std::vector<std::string>& lines, const fs::path& ta
   } cleanup{work};
 
   const fs::path xlsx = work / (target.stem().string() + ".xlsx");
-  WriteXlsx(lines, xlsx.string(), rightToLeft);
+  WriteXlsx(lines, xlsx.string(), rightToLeft, findings, showFindings);
   const fs::path outDir = work / "out";
   fs::create_directories(outDir);
   const std::string ext = target.extension().string().substr(1);
@@ -339,16 +378,17 @@ void CheckWorkbookTarget(const std::string& pXlsFile, const std::string& company
 }
 
 void ConvertToExcel(const std::string& pCsvFile, const std::string& pXlsFile, bool pOpenExcel,
-                    UserSeam& ui, const std::string& companyPath) {
+                    UserSeam& ui, const std::string& companyPath,
+                    const std::vector<Finding>& findings, bool showFindings) {
   CheckWorkbookTarget(pXlsFile, companyPath);
   const std::vector<std::string> lines = ReadCsvLines(pCsvFile);
   const fs::path target = PathFromUtf8(pXlsFile);
   // Written beside the file a link points to, so the link keeps pointing at the workbook.
   PendingFile pending(Resolved(target));
   if (Lower(target.extension().string()) == ".xlsx") {
-    WriteXlsx(lines, pending.path().string(), pOpenExcel);
+    WriteXlsx(lines, pending.path().string(), pOpenExcel, findings, showFindings);
   } else {
-    ConvertWithOffice(lines, target, pending.path(), pOpenExcel);
+    ConvertWithOffice(lines, target, pending.path(), pOpenExcel, findings, showFindings);
   }
   pending.Commit();
   if (pOpenExcel && !ui.OpenInSpreadsheet(pXlsFile)) {

@@ -121,6 +121,12 @@ std::string BuildOrderBy(const Panel& panel, const DocTypeTable& docTypes, bool&
   return orderBy;
 }
 
+bool AddressFromDocumentHeader(const Panel& panel, const DocTypeTable& docTypes) {
+  bool useDocs = Panel::On(panel.ChkDates) && panel.cmbByDoc == 0;
+  ResetUseDocsForDocType(panel, docTypes, useDocs);
+  return useDocs && AddressFromDocument(panel);
+}
+
 std::string BuildRecipientsStatement(const Panel& panel, const DocTypeTable& docTypes,
                                      const std::string& selectDbPath) {
   const bool documentsOn = Panel::On(panel.ChkDates);

@@ -33,6 +33,11 @@ std::string BuildSelect(const Panel& panel, const DocTypeTable& docTypes, int16_
 // The ORDER BY clause, with the same reset of `pUseDocs` and the same exception.
 std::string BuildOrderBy(const Panel& panel, const DocTypeTable& docTypes, bool& pUseDocs);
 
+// True when the recipients' name and address come from the document header: documents are
+// used (ChkDates on, cmbByDoc "issued"), the type is a stock document and cmbAddressFrom is on
+// the header. Such rows carry no zip. Throws std::out_of_range like BuildSelect.
+bool AddressFromDocumentHeader(const Panel& panel, const DocTypeTable& docTypes);
+
 // The whole statement as every output builds it: pUseDocs and pNotIssued computed from
 // ChkDates and cmbByDoc before each of the three calls. Throws std::out_of_range like
 // BuildSelect.

@@ -1,0 +1,303 @@
+// The dispatch preflight: each recipient row of the dispatch file through the rule table.
+#include "output/preflight.h"
+
+#include <algorithm>
+#include <cstdio>
+#include <stdexcept>
+#include <unordered_map>
+
+#include "import/codepage.h"
+#include "output/output.h"
+#include "select/select.h"
+#include "workdb/engine.h"
+
+namespace zdr {
+namespace {
+
+using output_internal::AppendCsvField;
+using output_internal::AppendValueText;
+
+std::string_view Trim(std::string_view s) {
+  const size_t b = s.find_first_not_of(' ');
+  if (b == std::string_view::npos) return {};
+  return s.substr(b, s.find_last_not_of(' ') - b + 1);
+}
+
+// Trimmed, with every run of blanks folded into one: how two texts are compared.
+std::string Folded(std::string_view s) {
+  std::string out;
+  for (const char c : Trim(s)) {
+    if (c == ' ' && !out.empty() && out.back() == ' ') continue;
+    out += c;
+  }
+  return out;
+}
+
+std::string ValueText(const db::Value& v) {
+  std::string out;
+  AppendValueText(v, out);
+  return out;
+}
+
+bool AllDigits(std::string_view s) {
+  for (const char c : s) {
+    if (c < '0' || c > '9') return false;
+  }
+  return true;
+}
+
+// 9 or 10 digits beginning with 0, dashes and blanks not counted.
+bool IsIsraeliTelephone(std::string_view s) {
+  std::string digits;
+  for (const char c : s) {
+    if (c == '-' || c == ' ') continue;
+    if (c < '0' || c > '9') return false;
+    digits += c;
+  }
+  return (digits.size() == 9 || digits.size() == 10) && digits[0] == '0';
+}
+
+// A character the file cannot carry: one Windows-1255 has no byte for (the writer refuses
+// the whole file), one of the code page's undefined bytes, or a control character.
+bool Uncarried(char32_t cp) {
+  if (cp < 0x20 || cp == 0x7F) return true;
+  const int b = CodePointToWin1255(cp);
+  return b < 0 || !IsWin1255Defined(static_cast<unsigned char>(b));
+}
+
+// "U+0416 Ж, U+00D9" for the uncarried characters of `text` (each once, at most five), or
+// "" when there are none.
+std::string UncarriedCharacters(std::string_view text) {
+  std::string out;
+  std::vector<char32_t> seen;
+  for (size_t pos = 0; pos < text.size();) {
+    const char32_t cp = NextCodePoint(text, pos);
+    if (!Uncarried(cp) || std::find(seen.begin(), seen.end(), cp) != seen.end()) continue;
+    seen.push_back(cp);
+    if (seen.size() > 5) {
+      out += ", ...";
+      break;
+    }
+    char code[16];
+    std::snprintf(code, sizeof code, "U+%04X", static_cast<unsigned>(cp));
+    if (!out.empty()) out += ", ";
+    out += code;
+    // Show the character itself only when it is printable.
+    if (cp >= 0xA0 && cp != 0xFFFD) {
+      out += ' ';
+      AppendUtf8(cp, out);
+    }
+  }
+  return out;
+}
+
+struct RowFields {
+  int key, name, address, city, zip, telephone, remarks;
+
+  explicit RowFields(const db::Snapshot& rs)
+      : key(rs.FieldIndex("AccountKey")),
+        name(rs.FieldIndex("AccountName")),
+        address(rs.FieldIndex("Address")),
+        city(rs.FieldIndex("City")),
+        zip(rs.FieldIndex("Zip")),
+        telephone(rs.FieldIndex("Telephone")),
+        remarks(rs.FieldIndex("DetailsLine1")) {}
+};
+
+// One text field of a row: as the books hold it, and as the file carries it.
+struct FieldText {
+  std::string books;    // the value's text
+  std::string written;  // cleaned and cut as the dispatch file writes it
+  std::string lost;     // cleaned text cut off the end; "" when nothing was cut
+
+  FieldText(const db::Value& v, int maxLength) {
+    AppendValueText(v, books);
+    AppendCsvField(v, maxLength, written);
+    std::string whole;
+    AppendCsvField(v, 0, whole);
+    if (whole.size() > written.size()) lost = whole.substr(written.size());
+  }
+};
+
+class Checker {
+ public:
+  Checker(int16_t layout, bool zipCarried, PreflightResult& result)
+      : lengths_(layout == 0 ? kPostLengths : kCourierLengths),
+        layout_(layout),
+        zipCarried_(zipCarried),
+        result_(result) {}
+
+  void Check(const db::Snapshot& rs, const RowFields& c, int64_t row) {
+    row_ = row;
+    key_ = ValueText(rs.Field(c.key));
+    const FieldText name(rs.Field(c.name), lengths_.name);
+    const FieldText address(rs.Field(c.address), lengths_.address);
+    const FieldText city(rs.Field(c.city), lengths_.city);
+    const FieldText telephone(rs.Field(c.telephone), lengths_.telephone);
+    const FieldText remarks(rs.Field(c.remarks), lengths_.remarks);
+
+    if (Trim(name.written).empty()) Add(RuleId::kNameMissing, name.books);
+    if (Trim(address.written).empty()) Add(RuleId::kAddressMissing, address.books);
+    if (Trim(city.written).empty()) Add(RuleId::kCityMissing, city.books);
+    if (zipCarried_) {
+      const std::string zip = ValueText(rs.Field(c.zip));
+      const std::string_view z = Trim(zip);
+      if (z.empty()) {
+        Add(RuleId::kZipEmpty, zip);
+      } else if (!AllDigits(z) || (z.size() != 5 && z.size() != 7)) {
+        Add(RuleId::kZipMalformed, zip);
+      }
+    }
+    const std::string_view phone = Trim(telephone.written);
+    if (!phone.empty() && !IsIsraeliTelephone(phone)) {
+      Add(RuleId::kTelephoneMalformed, telephone.books);
+    }
+    AddCut(RuleId::kNameCut, name);
+    AddCut(RuleId::kAddressCut, address);
+    AddCut(RuleId::kCityCut, city);
+    AddCut(RuleId::kTelephoneCut, telephone);
+    AddCut(RuleId::kRemarksCut, remarks);
+    CheckDuplicate(name, address, city);
+
+    if (layout_ == 1) {
+      const FieldText key(rs.Field(c.key), 0);
+      AddCharacters("מפתח חשבון", key);
+    }
+    AddCharacters(RuleOf(RuleId::kNameMissing).field, name);
+    AddCharacters(RuleOf(RuleId::kAddressMissing).field, address);
+    AddCharacters(RuleOf(RuleId::kCityMissing).field, city);
+    AddCharacters(RuleOf(RuleId::kTelephoneMalformed).field, telephone);
+    AddCharacters(RuleOf(RuleId::kRemarksCut).field, remarks);
+  }
+
+ private:
+  void Add(RuleId id, std::string value, std::string_view detail = {},
+           std::string_view field = {}) {
+    const PreflightRule& rule = RuleOf(id);
+    Finding f{id,
+              rule.severity,
+              row_,
+              key_,
+              std::string(field.empty() ? rule.field : field),
+              std::move(value),
+              std::string(rule.message)};
+    if (!detail.empty()) {
+      f.message += ": ";
+      f.message += detail;
+    }
+    (rule.severity == Severity::kError ? result_.errors : result_.warnings) += 1;
+    result_.findings.push_back(std::move(f));
+  }
+
+  // Only a cut that loses more than blanks is reported.
+  void AddCut(RuleId id, const FieldText& f) {
+    if (Trim(f.lost).empty()) return;
+    Add(id, f.books, "החלק שאבד \"" + f.lost + "\"");
+  }
+
+  void AddCharacters(std::string_view field, const FieldText& f) {
+    const std::string found = UncarriedCharacters(f.written);
+    if (!found.empty()) Add(RuleId::kCharacter, f.books, found, field);
+  }
+
+  // Rows with the same name, address and city as an earlier row; rows missing the name or
+  // the address are left to those rules.
+  void CheckDuplicate(const FieldText& name, const FieldText& address, const FieldText& city) {
+    std::string n = Folded(name.written), a = Folded(address.written);
+    if (n.empty() || a.empty()) return;
+    std::string key = n + '\n' + a + '\n' + Folded(city.written);
+    const auto [it, inserted] = firstRow_.try_emplace(std::move(key), row_);
+    if (inserted) return;
+    std::string value = name.books + " / " + address.books;
+    if (!Trim(city.books).empty()) value += " / " + city.books;
+    Add(RuleId::kDuplicate, std::move(value), "שורה " + std::to_string(it->second));
+  }
+
+  DispatchLengths lengths_;
+  int16_t layout_;
+  bool zipCarried_;
+  PreflightResult& result_;
+  int64_t row_ = 0;
+  std::string key_;
+  std::unordered_map<std::string, int64_t> firstRow_;
+};
+
+}  // namespace
+
+const PreflightRule& RuleOf(RuleId id) {
+  for (const PreflightRule& r : kPreflightRules) {
+    if (r.id == id) return r;
+  }
+  throw std::logic_error("preflight rule missing from the table");
+}
+
+std::string_view SeverityText(Severity s) {
+  return s == Severity::kError ? "שגיאה" : "אזהרה";
+}
+
+PreflightResult RunPreflight(const std::string& pDBFile, int16_t pFileFormat, const Panel& panel,
+                             const DocTypeTable& docTypes, const std::string& selectDbPath,
+                             UserSeam& ui) {
+  PreflightResult result;
+  ProgressReporter started(ui, 1);
+  if (pFileFormat != 0 && pFileFormat != 1) return result;  // CreateCSV writes no rows
+  const bool zipCarried = !AddressFromDocumentHeader(panel, docTypes);
+
+  db::Database database = db::Database::Open(pDBFile);
+  db::Snapshot rs = database.OpenSnapshot(BuildRecipientsStatement(panel, docTypes, selectDbPath));
+  if (rs.AtStart() || rs.AtEnd()) return result;
+  rs.MoveLast();
+  const int64_t count = rs.RecordCount();
+  const RowFields fields(rs);
+  Checker checker(pFileFormat, zipCarried, result);
+  ProgressReporter progress(ui, static_cast<double>(count));
+  rs.MoveFirst();
+  while (!rs.AtEnd()) {
+    ++result.rows;
+    checker.Check(rs, fields, result.rows + 1);  // the header is row 1
+    rs.MoveNext();
+    if (result.rows % 64 == 0) progress.Update(static_cast<double>(result.rows));
+  }
+  return result;
+}
+
+std::array<std::string, 6> FindingCells(const Finding& f) {
+  return {std::string(SeverityText(f.severity)),
+          std::to_string(f.row),
+          f.accountKey,
+          f.field,
+          f.value,
+          f.message};
+}
+
+std::string FindingsCsv(const PreflightResult& result) {
+  std::string out;
+  auto cell = [&out](std::string_view text, bool first) {
+    if (!first) out += ',';
+    if (text.find_first_of(",\"\r\n") == std::string_view::npos) {
+      out += text;
+      return;
+    }
+    out += '"';
+    for (const char c : text) {
+      if (c == '"') out += '"';
+      out += c;
+    }
+    out += '"';
+  };
+  for (size_t i = 0; i < kFindingHeadings.size(); ++i) cell(kFindingHeadings[i], i == 0);
+  out += '\n';
+  for (const Finding& f : result.findings) {
+    const auto cells = FindingCells(f);
+    for (size_t i = 0; i < cells.size(); ++i) cell(cells[i], i == 0);
+    out += '\n';
+  }
+  return out;
+}
+
+std::string PreflightCounts(const PreflightResult& result) {
+  return "שגיאות: " + std::to_string(result.errors) +
+         ", אזהרות: " + std::to_string(result.warnings);
+}
+
+}  // namespace zdr
