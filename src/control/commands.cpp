@@ -92,10 +92,25 @@ std::string Control::CmdPreview() {
   });
 }
 
+// The checks' counts after a status text: "הכנת הקובץ הסתיימה. שגיאות: 0, אזהרות: 2".
+static std::string WithCounts(std::string_view status, const PreflightResult& r) {
+  return std::string(status) + ". " + PreflightCounts(r);
+}
+
+void Control::RunPostILChecks() {
+  preflight_ = {};
+  ui_.SetStatus("בודק את הנמענים");
+  preflight_ = RunPreflight(state_.workDbPath, postIL_.FileFormat, panel_, docTypes_,
+                            state_.selectDbPath, ui_);
+}
+
 // The dispatch file. The workbook named by FilePath is checked before anything is loaded,
 // and replaced only by a complete workbook from a load that reported no failure: until then
 // the old file stays as it was.
-std::string Control::CmdBuildPostIL() {
+std::string Control::CmdBuildPostIL(bool strict) {
+  preflight_ = {};
+  lastPostCsv_.clear();
+  lastPostWorkbook_.clear();
   try {
     if (postIL_.FilePath.empty()) {
       ui_.ShowMessage("לא הוגדר קובץ פלט", kTitleError, MsgIcon::Critical);
@@ -111,6 +126,11 @@ std::string Control::CmdBuildPostIL() {
     FailureWatch watch(ui_);
     zdr::ReadAllData(false, panel_, state_, docTypes_, watch);
     ui_.YieldToEvents();
+    RunPostILChecks();
+    if (strict && preflight_.errors > 0) {
+      ui_.SetStatus(WithCounts("הקובץ לא נכתב", preflight_));
+      return "";
+    }
     ui_.SetStatus("מכין קובץ");
     const std::string csv = TempFile("zdpost1.csv");
     CreateCSV(csv, state_.workDbPath, postIL_.FileFormat, panel_, docTypes_, state_.selectDbPath,
@@ -120,12 +140,41 @@ std::string Control::CmdBuildPostIL() {
                          " לא נכתב מחדש, כי קריאת הנתונים לא הושלמה (ראו את ההודעה הקודמת)");
     }
     ui_.YieldToEvents();
-    ConvertToExcel(csv, postIL_.FilePath, postIL_.OpenExcel == 1, ui_, state_.companyPath);
-    ui_.SetStatus("הכנת הקובץ הסתיימה");
+    ConvertToExcel(csv, postIL_.FilePath, postIL_.OpenExcel == 1, ui_, state_.companyPath,
+                   preflight_.findings);
+    lastPostCsv_ = csv;
+    lastPostWorkbook_ = postIL_.FilePath;
+    ui_.SetStatus(WithCounts("הכנת הקובץ הסתיימה", preflight_));
     return postIL_.FilePath;
   } catch (const std::exception& e) {
     ui_.ShowMessage(e.what(), kTitleFault, MsgIcon::Critical);
     return "";
+  }
+}
+
+bool Control::CmdCheckPostIL() {
+  preflight_ = {};
+  try {
+    ReadAllData(false);
+    ui_.YieldToEvents();
+    RunPostILChecks();
+    ui_.SetStatus(WithCounts("הבדיקה הסתיימה", preflight_));
+    return true;
+  } catch (const std::exception& e) {
+    preflight_ = {};
+    ui_.ShowMessage(e.what(), kTitleFault, MsgIcon::Critical);
+    return false;
+  }
+}
+
+bool Control::OpenPostILFindings() {
+  if (lastPostWorkbook_.empty() || preflight_.findings.empty()) return false;
+  try {
+    ConvertToExcel(lastPostCsv_, lastPostWorkbook_, true, ui_, preflight_.findings, true);
+    return true;
+  } catch (const std::exception& e) {
+    ui_.ShowMessage(e.what(), kTitleFault, MsgIcon::Critical);
+    return false;
   }
 }
 

@@ -11,6 +11,7 @@
 #include "control/userseam.h"
 #include "import/doctypes.h"
 #include "output/outputdefs.h"
+#include "output/preflight.h"
 
 namespace zdr {
 
@@ -45,7 +46,24 @@ class Control {
   // string when it failed (the failure has been shown through the seam).
   std::string CmdLabPrev();
   std::string CmdPreview();
-  std::string CmdBuildPostIL();
+  // The dispatch command checks the recipient rows before it writes them (RunPreflight),
+  // puts the findings on the workbook's sheet "בדיקה" and their counts in the status line.
+  // With `strict`, an error finding stops it before the dispatch file and the workbook are
+  // written; it then returns "" with the counts in the status line and nothing shown.
+  std::string CmdBuildPostIL(bool strict = false);
+
+  // The dispatch checks alone: the data load and RunPreflight, no file written, the counts
+  // in the status line. Returns false when the load or the checks failed (shown through
+  // the seam); the findings are then those of an empty check.
+  bool CmdCheckPostIL();
+
+  // The checks of the last dispatch command or check.
+  const PreflightResult& lastPreflight() const { return preflight_; }
+
+  // Writes the workbook of the last dispatch command again, opening on its findings sheet,
+  // and hands it to the spreadsheet program. Returns false when there is no such workbook
+  // or it failed (shown through the seam).
+  bool OpenPostILFindings();
 
   // The account picker flow up to showing the picker: asks whether to rescan when the
   // accounts were scanned before, scans when needed, and records the picker sort index.
@@ -62,6 +80,9 @@ class Control {
   UserSeam& ui() { return ui_; }
 
  private:
+  // The data load's rows through RunPreflight into preflight_.
+  void RunPostILChecks();
+
   SettingsStore& store_;
   UserSeam& ui_;
   Panel panel_;
@@ -69,6 +90,8 @@ class Control {
   DocTypeTable docTypes_;
   LabelSettings labels_;
   PostILSettings postIL_;
+  PreflightResult preflight_;
+  std::string lastPostCsv_, lastPostWorkbook_;  // of the last dispatch command that wrote
 };
 
 }  // namespace zdr

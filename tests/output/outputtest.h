@@ -6,6 +6,7 @@
 #include <gtest/gtest.h>
 #include <stdlib.h>
 
+#include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <iterator>
@@ -71,6 +72,18 @@ inline std::vector<AccountRow> NumberedAccounts(int n) {
         {k, "לקוח " + k, "רחוב " + k, "חיפה", "3100" + k, "כרמל", "משה " + k, "04-555" + k});
   }
   return rows;
+}
+
+// A Python that has openpyxl, to read workbooks back; "" when there is none.
+inline std::string Python() {
+  static const std::string found = [] {
+    for (const char* p : {"/usr/bin/python3", "python3"}) {
+      const std::string cmd = std::string(p) + " -c 'import openpyxl' >/dev/null 2>&1";
+      if (std::system(cmd.c_str()) == 0) return std::string(p);
+    }
+    return std::string();
+  }();
+  return found;
 }
 
 class OutputTest : public ::testing::Test {

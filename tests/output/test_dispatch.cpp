@@ -136,14 +136,6 @@ TEST_F(DispatchTest, WideCountGivesCompleteFile) {
 
 // The workbook, read back with openpyxl.
 
-std::string Python() {
-  for (const char* p : {"/usr/bin/python3", "python3"}) {
-    const std::string cmd = std::string(p) + " -c 'import openpyxl' >/dev/null 2>&1";
-    if (std::system(cmd.c_str()) == 0) return p;
-  }
-  return {};
-}
-
 class WorkbookTest : public DispatchTest {
  protected:
   // The sheet as "rtl|rows|cols" then one line per row of "type:value" cells.

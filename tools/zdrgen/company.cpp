@@ -338,8 +338,59 @@ struct Generator {
       stored.push_back(std::move(s));
       truth.accounts.push_back(std::move(t));
     }
+    PlantDispatchFaults(records);
     records.push_back(MarkerAccount("CLOSING", "CLOSING RECORD"));
     WriteRecords(folder / "ACT.fix", records);
+  }
+
+  // Rewrites the last six live accounts of a company of some size with faults a dispatch
+  // upload refuses or misroutes, one of each kind the checks must find (see
+  // AccountTruth::dispatchFault). Draws no random numbers, so the rest of the company stays
+  // as it was.
+  void PlantDispatchFaults(std::vector<std::string>& records) {
+    if (usable.size() < 20) return;
+    const char* const kinds[] = {"address",   "zip",       "telephone",
+                                 "duplicate", "duplicate", "character"};
+    const size_t first = usable.size() - std::size(kinds);
+    for (size_t n = 0; n < std::size(kinds); ++n) {
+      const int i = usable[first + n];
+      AccountTruth& t = truth.accounts[i];
+      const std::string kind = kinds[n];
+      t.dispatchFault = kind;
+      if (t.address.empty()) t.address = "הרצל 1";
+      if (t.city.empty()) t.city = "חיפה";
+      if (t.zip.size() != 5) t.zip = "31000";
+      if (kind == "address") t.address = "";
+      if (kind == "zip") t.zip = "310";
+      if (kind == "telephone") t.telephone = "123-45";
+      if (kind == "duplicate") {
+        t.name = "כהן משה";
+        t.address = "הנביאים 12";
+        t.city = "ירושלים";
+      }
+      AccountFields f;
+      f.key = HostField(t.key, 8);
+      f.name = HostField(t.name, 30);
+      if (kind == "character") {
+        // A box-drawing character of the host's screen, kept as its byte by the import.
+        t.name = "מאפיית כהן";
+        f.name = PadRaw("\xD9 " + HostVisual(t.name), 30);
+        t.unambiguousText = false;
+      }
+      f.sortCode = t.sortCode;
+      f.cutOff = t.cutOff;
+      f.telephone = HostField(t.telephone, 30);
+      f.address = HostField(t.address, 30);
+      f.district = HostField(t.district, 15);
+      f.city = HostField(t.city, 15);
+      f.zip = HostField(t.zip, 5);
+      f.details = HostField(t.details, 50);
+      f.agent = t.agent;
+      records[static_cast<size_t>(t.record - 1)] = AccountRecord(f);
+      stored[i].name = f.name;
+      stored[i].address = f.address;
+      stored[i].city = t.city;
+    }
   }
 
   void WriteItems(const fs::path& folder) {

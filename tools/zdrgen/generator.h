@@ -218,6 +218,11 @@ struct AccountTruth {
   // The name and address texts are such that their display order reads back unambiguously
   // (see the generator's notes on mixed text).
   bool unambiguousText = true;
+  // A fault planted on purpose for the dispatch checks, "" for none: "address" (no street),
+  // "zip" (three digits), "telephone" (not a telephone), "duplicate" (two accounts with the
+  // same name, address and city), "character" (a name holding a byte Windows-1255 leaves
+  // undefined).
+  std::string dispatchFault;
 };
 
 struct ItemTruth {

@@ -1,0 +1,302 @@
+// The dispatch checks: one row per rule on a hand-made company, the layouts' differences,
+// the findings sheet and CSV, and the faults the generator plants in its sample company.
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <map>
+#include <set>
+
+#include "control/control.h"
+#include "control/settings.h"
+#include "output/outputtest.h"
+#include "output/preflight.h"
+#include "zdrgen/generator.h"
+
+namespace zdr::testing {
+namespace {
+
+// "row:rule" for every finding, in order.
+std::vector<std::string> Found(const PreflightResult& r) {
+  std::vector<std::string> out;
+  for (const Finding& f : r.findings) {
+    out.push_back(std::to_string(f.row) + ":" + std::string(RuleOf(f.rule).message));
+  }
+  return out;
+}
+
+std::string At(int64_t row, RuleId id) {
+  return std::to_string(row) + ":" + std::string(RuleOf(id).message);
+}
+
+class PreflightTest : public OutputTest {
+ protected:
+  PreflightResult Check(const std::vector<AccountRow>& rows, int16_t layout,
+                        const std::vector<HeadRow>& heads = {}) {
+    return RunPreflight(BuildDb(rows, heads), layout, panel, docTypes, "", seam);
+  }
+};
+
+const AccountRow kClean{"1", "כהן משה", "הרצל 5", "חיפה", "31000", "", "", "04-8500000"};
+
+AccountRow With(std::string key, Text AccountRow::*field, Text value) {
+  AccountRow r = kClean;
+  r.key = std::move(key);
+  r.name = "לקוח " + r.key;  // distinct from the clean row: no duplicate
+  r.*field = std::move(value);
+  return r;
+}
+
+// One row per rule after a clean row (row 2), so that each rule is found once, on its row.
+std::vector<AccountRow> OneRowPerRule() {
+  AccountRow duplicate = kClean;
+  duplicate.key = "13";
+  duplicate.name = " כהן  משה ";  // blanks do not make it another recipient
+  return {
+      kClean,                                                            // row 2
+      With("3", &AccountRow::name, std::nullopt),                        // 3 name missing
+      With("4", &AccountRow::address, " "),                              // 4 address missing
+      With("5", &AccountRow::city, std::nullopt),                        // 5 city missing
+      With("6", &AccountRow::zip, std::nullopt),                         // 6 zip empty
+      With("7", &AccountRow::zip, "3100A"),                              // 7 zip malformed
+      With("8", &AccountRow::telephone, "8500000"),                      // 8 not a telephone
+      With("9", &AccountRow::name, std::string(26, 'n') + "xy"),         // 9 name cut
+      With("10", &AccountRow::address, "רחוב " + std::string(40, 'a')),  // 10 address cut
+      With("11", &AccountRow::city, "ירושלים עיר הקודש"),                // 11 city cut
+      With("12", &AccountRow::telephone, "03-555-1234/5"),               // 12 telephone cut
+      duplicate,                                                         // 13 duplicate
+      With("14", &AccountRow::address, "הרצל Ж 5"),                      // 14 character
+  };
+}
+
+TEST_F(PreflightTest, EachRuleFoundOnceOnItsRow) {
+  const PreflightResult r = Check(OneRowPerRule(), 0);
+  EXPECT_EQ(Found(r), (std::vector<std::string>{
+                          At(3, RuleId::kNameMissing), At(4, RuleId::kAddressMissing),
+                          At(5, RuleId::kCityMissing), At(6, RuleId::kZipEmpty),
+                          At(7, RuleId::kZipMalformed), At(8, RuleId::kTelephoneMalformed),
+                          At(9, RuleId::kNameCut), At(10, RuleId::kAddressCut),
+                          At(11, RuleId::kCityCut), At(12, RuleId::kTelephoneCut),
+                          At(13, RuleId::kDuplicate), At(14, RuleId::kCharacter)}));
+  EXPECT_EQ(r.rows, 13);
+  EXPECT_EQ(r.errors, 6);
+  EXPECT_EQ(r.warnings, 6);
+  EXPECT_EQ(seam.progress.back(), 0);
+}
+
+TEST_F(PreflightTest, FindingCarriesKeyFieldValueAndWhatWasLost) {
+  const PreflightResult r = Check(OneRowPerRule(), 0);
+  std::map<int64_t, std::array<std::string, 6>> cells;
+  for (const Finding& f : r.findings) cells[f.row] = FindingCells(f);
+  using Cells = std::array<std::string, 6>;
+  EXPECT_EQ(cells[9], (Cells{"אזהרה", "9", "9", "שם", std::string(26, 'n') + "xy",
+                             "השם נחתך ל-25 תווים: החלק שאבד \"nxy\""}));
+  EXPECT_EQ(cells[12], (Cells{"אזהרה", "12", "12", "טלפון", "03-555-1234/5",
+                              "הטלפון נחתך ל-11 תווים: החלק שאבד \"/5\""}));
+  EXPECT_EQ(cells[13], (Cells{"אזהרה", "13", "13", "שם וכתובת", " כהן  משה  / הרצל 5 / חיפה",
+                              "אותו שם וכתובת כבר מופיעים בקובץ: שורה 2"}));
+  EXPECT_EQ(cells[14], (Cells{"שגיאה", "14", "14", "כתובת", "הרצל Ж 5",
+                              "תווים שהקובץ אינו יכול לשאת: U+0416 Ж"}));
+  EXPECT_EQ(cells[7][0], "שגיאה");
+  EXPECT_EQ(cells[7][4], "3100A");
+}
+
+// The courier layout cuts only the remarks and carries the account key.
+TEST_F(PreflightTest, CourierLayoutCutsNothingButChecksTheKey) {
+  std::vector<AccountRow> rows = OneRowPerRule();
+  AccountRow tabInKey = kClean;
+  tabInKey.key = "קוד\t15";
+  tabInKey.name = "לקוח 15";
+  rows.push_back(tabInKey);
+  const PreflightResult r = Check(rows, 1);
+  EXPECT_EQ(Found(r), (std::vector<std::string>{
+                          At(3, RuleId::kNameMissing), At(4, RuleId::kAddressMissing),
+                          At(5, RuleId::kCityMissing), At(6, RuleId::kZipEmpty),
+                          At(7, RuleId::kZipMalformed), At(8, RuleId::kTelephoneMalformed),
+                          At(12, RuleId::kTelephoneMalformed), At(13, RuleId::kDuplicate),
+                          At(14, RuleId::kCharacter), At(15, RuleId::kCharacter)}));
+  EXPECT_EQ(r.findings.back().field, "מפתח חשבון");
+  EXPECT_EQ(r.findings.back().message, "תווים שהקובץ אינו יכול לשאת: U+0009");
+}
+
+TEST_F(PreflightTest, TelephonesAndCharacters) {
+  struct Case {
+    Text telephone, name;
+    bool found;
+  };
+  const Case cases[] = {
+      {"04-8500000", "א", false},
+      {"052-1234567", "א", false},
+      {"052 123 4567", "א", false},
+      {"0521234567", "א", false},
+      {std::nullopt, "א", false},
+      {"4-8500000", "א", true},
+      {"+972-52-1234567", "א", true},
+      {"0-52-123-45", "א", true},
+      {"אין", "א", true},
+      {"04-8500000", "א €₪\"'", false},
+      {"04-8500000", "é", true},
+      {"04-8500000", "\xC3\x99", true},  // U+00D9 undefined
+      {"04-8500000", "א\x7F", true},
+  };
+  std::vector<AccountRow> rows;
+  std::set<int64_t> expected;
+  for (size_t i = 0; i < std::size(cases); ++i) {
+    AccountRow row = kClean;
+    row.key = std::to_string(i);
+    row.name = *cases[i].name + " " + row.key;
+    row.telephone = cases[i].telephone;
+    rows.push_back(row);
+    if (cases[i].found) expected.insert(static_cast<int64_t>(i) + 2);
+  }
+  std::set<int64_t> found;
+  for (const Finding& f : Check(rows, 1).findings) found.insert(f.row);
+  EXPECT_EQ(found, expected);
+}
+
+// With the address from the document header there is no zip to check; the rest reads the
+// header's name and address.
+TEST_F(PreflightTest, DocumentVariantChecksNoZip) {
+  UseDocuments();
+  for (int16_t layout : {0, 1}) {
+    const PreflightResult r =
+        Check({kClean}, layout,
+              {{"1", 501, "כהן משה", "הרצל 5", "חיפה", "הערה"},
+               {"1", 502, "לוי", std::nullopt, "עכו", std::string(100, 'r')}});
+    EXPECT_EQ(Found(r), std::vector<std::string>{At(3, RuleId::kAddressMissing)});
+  }
+}
+
+TEST_F(PreflightTest, NoRowsNoFindings) {
+  EXPECT_EQ(Check({}, 0).rows, 0);
+  const PreflightResult r = Check(OneRowPerRule(), 2);  // a layout CreateCSV writes nothing for
+  EXPECT_EQ(r.rows, 0);
+  EXPECT_TRUE(r.findings.empty());
+}
+
+TEST(FindingsCsvTest, HeaderThenQuotedCells) {
+  PreflightResult r;
+  r.findings.push_back(
+      {RuleId::kNameCut, Severity::kWarning, 4, "A1", "שם", "כהן, \"משה\"", "השם נחתך"});
+  EXPECT_EQ(FindingsCsv(r),
+            "חומרה,שורה,מפתח חשבון,שדה,ערך,הודעה\n"
+            "אזהרה,4,A1,שם,\"כהן, \"\"משה\"\"\",השם נחתך\n");
+  r.errors = 1;
+  r.warnings = 2;
+  EXPECT_EQ(PreflightCounts(r), "שגיאות: 1, אזהרות: 2");
+}
+
+// The workbook's findings sheet, read back with Python.
+
+std::string RunPython(const std::string& script, const std::string& out) {
+  const std::string cmd =
+      "PYTHONIOENCODING=utf-8 " + Python() + " " + script + " > " + out + " 2>&1";
+  EXPECT_EQ(std::system(cmd.c_str()), 0) << ReadBytes(out);
+  return ReadBytes(out);
+}
+
+class FindingsSheetTest : public PreflightTest {
+ protected:
+  void SetUp() override {
+    PreflightTest::SetUp();
+    if (Python().empty()) GTEST_SKIP() << "python3 with openpyxl is not installed";
+  }
+};
+
+TEST_F(FindingsSheetTest, DispatchSheetIsTheSameWithAndWithoutFindings) {
+  std::vector<AccountRow> rows = OneRowPerRule();
+  rows.pop_back();  // a character the file cannot hold would stop CreateCSV
+  const std::string db = BuildDb(rows);
+  const std::string csv = PathOf("zdpost1.csv");
+  CreateCSV(csv, db, 1, panel, docTypes, "", post, seam, Date::FromParts(2024, 3, 5));
+  const PreflightResult r = RunPreflight(db, 1, panel, docTypes, "", seam);
+  ASSERT_FALSE(r.findings.empty());
+  for (bool open : {false, true}) {
+    const std::string tag = open ? "open" : "closed";
+    ConvertToExcel(csv, PathOf("plain-" + tag + ".xlsx"), open, seam);
+    ConvertToExcel(csv, PathOf("checked-" + tag + ".xlsx"), open, seam, r.findings);
+  }
+  // Per pair: the dispatch sheets' bytes equal, and the sheet names of the checked workbook.
+  const std::string script = PathOf("compare.py");
+  std::ofstream(script) << "import sys, zipfile\n"
+                           "for tag in ('closed', 'open'):\n"
+                           "    a = zipfile.ZipFile(sys.argv[1] + '/plain-' + tag + '.xlsx')\n"
+                           "    b = zipfile.ZipFile(sys.argv[1] + '/checked-' + tag + '.xlsx')\n"
+                           "    part = 'xl/worksheets/sheet1.xml'\n"
+                           "    print(a.read(part) == b.read(part), 'name=\"בדיקה\"' in "
+                           "b.read('xl/workbook.xml').decode())\n";
+  EXPECT_EQ(RunPython(script + " " + dir_.string(), PathOf("compare.out")),
+            "True True\nTrue True\n");
+}
+
+TEST_F(FindingsSheetTest, FindingsSheetIsRightToLeftTextAndCanOpenFirst) {
+  std::vector<AccountRow> rows = OneRowPerRule();
+  rows.pop_back();
+  const std::string db = BuildDb(rows);
+  const std::string csv = PathOf("zdpost1.csv");
+  CreateCSV(csv, db, 0, panel, docTypes, "", post, seam);
+  const PreflightResult r = RunPreflight(db, 0, panel, docTypes, "", seam);
+  ConvertToExcel(csv, PathOf("out.xlsx"), false, seam, r.findings, true);
+  const std::string script = PathOf("read.py");
+  std::ofstream(script) << "import sys, openpyxl\n"
+                           "wb = openpyxl.load_workbook(sys.argv[1])\n"
+                           "print(wb.sheetnames, wb.active.title)\n"
+                           "ws = wb['בדיקה']\n"
+                           "print(ws.sheet_view.rightToLeft, ws.max_row)\n"
+                           "print(set(type(c.value).__name__ for row in ws.iter_rows() "
+                           "for c in row if c.value is not None))\n"
+                           "print('|'.join(c.value for c in ws[1]))\n"
+                           "print('|'.join(c.value or '' for c in ws[2]))\n";
+  EXPECT_EQ(RunPython(script + " " + PathOf("out.xlsx"), PathOf("read.out")),
+            "['Sheet1', 'בדיקה'] בדיקה\n"
+            "True " +
+                std::to_string(r.findings.size() + 1) +
+                "\n"
+                "{'str'}\n"
+                "חומרה|שורה|מפתח חשבון|שדה|ערך|הודעה\n"
+                "שגיאה|3|3|שם||חסר שם הנמען\n");
+}
+
+// The sample company: every fault the generator planted is found on its account.
+
+TEST(SampleCompanyPreflightTest, FindsThePlantedFaults) {
+  const std::filesystem::path root =
+      std::filesystem::temp_directory_path() / ("zdr-preflight-" + std::to_string(::getpid()));
+  std::filesystem::remove_all(root);
+  setenv("Temp", root.c_str(), 1);
+  zdrgen::Options options;
+  options.seed = 7;
+  const zdrgen::CompanyTruth truth = zdrgen::WriteCompany(root / "company", options, "חברה");
+  const std::map<std::string, RuleId> rules = {{"address", RuleId::kAddressMissing},
+                                               {"zip", RuleId::kZipMalformed},
+                                               {"telephone", RuleId::kTelephoneMalformed},
+                                               {"duplicate", RuleId::kDuplicate},
+                                               {"character", RuleId::kCharacter}};
+  test::RecordingSeam seam;
+  MemorySettingsStore store;
+  Control control(store, seam);
+  control.Initialize();
+  control.state().companyPath = (root / "company").string();
+  ASSERT_TRUE(control.CmdCheckPostIL());
+  std::set<std::pair<std::string, RuleId>> found;
+  for (const Finding& f : control.lastPreflight().findings) found.insert({f.accountKey, f.rule});
+
+  int planted = 0, duplicates = 0;
+  for (const zdrgen::AccountTruth& a : truth.accounts) {
+    if (a.dispatchFault.empty()) continue;
+    ++planted;
+    const bool hit = found.contains({a.key, rules.at(a.dispatchFault)});
+    if (a.dispatchFault == "duplicate") {
+      duplicates += hit;  // the later of the two rows
+    } else {
+      EXPECT_TRUE(hit) << a.dispatchFault << " on " << a.key;
+    }
+  }
+  EXPECT_EQ(planted, 6);
+  EXPECT_EQ(duplicates, 1);
+  EXPECT_TRUE(seam.messages.empty());
+  EXPECT_EQ(seam.statuses.back(), "הבדיקה הסתיימה. " + PreflightCounts(control.lastPreflight()));
+  std::filesystem::remove_all(root);
+}
+
+}  // namespace
+}  // namespace zdr::testing
