@@ -23,10 +23,14 @@ namespace {
 const char* const kUsage =
     "usage: zdrlab labels|list|post [--company DIR] [--settings FILE] [--set NAME=VALUE]... "
     "[--open]\n"
+    "       zdrlab post [--check] [--strict] ...\n"
     "  (each option's value may also follow an equals sign: --set=NAME=VALUE)\n"
     "  labels  the label sheet zdrlab1.htm\n"
     "  list    the address list zdrlab2.htm\n"
-    "  post    the dispatch file zdpost1.csv and its workbook (FilePath)\n"
+    "  post    the dispatch file zdpost1.csv and its workbook (FilePath), the rows' findings\n"
+    "          on its sheet \"בדיקה\"\n"
+    "  --check   post: only check the rows; the findings go to standard output as CSV\n"
+    "  --strict  post: any error finding gives exit code 3, and no file is written\n"
     "Files are written in the folder named by Temp (else the system's temporary folder).\n"
     "NAME is a key of section Params or PostIL of the settings, or one of txtFromRef, "
     "txtToRef, ChkByItems, txtFromItmKey, txtToItmKey, txtFromItmSort, txtToItmSort, "
@@ -144,7 +148,7 @@ int RunCli(const std::vector<std::string>& args, SettingsStore& defaultStore) {
   const std::string command = args[0];
   std::optional<std::string> company, settingsFile;
   std::vector<std::pair<std::string, std::string>> sets;
-  bool open = false;
+  bool open = false, check = false, strict = false;
   for (size_t i = 1; i < args.size(); ++i) {
     // "--name=value" is "--name value".
     std::string a = args[i];
@@ -173,6 +177,8 @@ int RunCli(const std::vector<std::string>& args, SettingsStore& defaultStore) {
         sets.emplace_back(kv.substr(0, eq), kv.substr(eq + 1));
       } else if (a == "--open" && !inlineValue) {
         open = true;
+      } else if ((a == "--check" || a == "--strict") && command == "post" && !inlineValue) {
+        (a == "--check" ? check : strict) = true;
       } else {
         throw std::invalid_argument("unknown option " + a);
       }
@@ -206,13 +212,23 @@ int RunCli(const std::vector<std::string>& args, SettingsStore& defaultStore) {
     }
   }
 
+  if (check) {
+    if (!control.CmdCheckPostIL() || ui.failures() > 0) return 1;
+    std::cout << FindingsCsv(control.lastPreflight()) << std::flush;
+    return strict && control.lastPreflight().errors > 0 ? 3 : 0;
+  }
   std::string produced;
   if (command == "labels") {
     produced = control.CmdLabPrev();
   } else if (command == "list") {
     produced = control.CmdPreview();
   } else {
-    produced = control.CmdBuildPostIL();
+    produced = control.CmdBuildPostIL(strict);
+    if (produced.empty() && ui.failures() == 0 && strict && control.lastPreflight().errors > 0) {
+      // Refused: the findings are the only output.
+      std::cout << FindingsCsv(control.lastPreflight()) << std::flush;
+      return 3;
+    }
   }
   if (produced.empty() || ui.failures() > 0) return 1;
   std::cout << produced << std::endl;

@@ -17,6 +17,10 @@ bool IsCliCommand(const std::string& word);
 // --settings FILE is given. Prints the output's path on standard output and everything else
 // on standard error. Returns the process exit code: 0 when the command produced its file,
 // 1 when it failed, 2 for wrong usage.
+//
+// `post --check` writes no file: it prints the dispatch checks' findings on standard output
+// as CSV (FindingsCsv) and returns 0. `post --strict` returns 3 when a check found an error:
+// the files are then not written and the findings are printed as with --check.
 int RunCli(const std::vector<std::string>& args, SettingsStore& defaultStore);
 
 }  // namespace zdr

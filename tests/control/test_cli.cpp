@@ -183,7 +183,35 @@ TEST_F(CliTest, PostWritesTheWorkbook) {
   const std::string csv = zdr::Win1255ToUtf8(ReadFile(temp_ / "zdpost1.csv"));
   EXPECT_EQ(csv.rfind("מספר,שם משפחה,שם פרטי,", 0), 0u);
   EXPECT_NE(csv.find(",0.5,"), std::string::npos);
-  EXPECT_NE(r.err.find("הכנת הקובץ הסתיימה"), std::string::npos);
+  EXPECT_NE(r.err.find("הכנת הקובץ הסתיימה. שגיאות: "), std::string::npos) << r.err;
+}
+
+// The generated company holds rows the post refuses, planted on purpose.
+TEST_F(CliTest, PostCheckPrintsTheFindingsAndStrictRefusesTheErrors) {
+  const fs::path book = temp_ / "post.xlsx";
+  auto args = Base("post");
+  args.insert(args.end(), {"--set", "FilePath=" + book.string(), "--check"});
+  const RunResult check = Run(args);
+  ASSERT_EQ(check.exitCode, 0) << check.err;
+  EXPECT_EQ(check.out.rfind("חומרה,שורה,מפתח חשבון,שדה,ערך,הודעה\n", 0), 0u) << check.out;
+  EXPECT_NE(check.out.find(",טלפון,123-45,הטלפון אינו מספר ישראלי\n"), std::string::npos);
+  EXPECT_NE(check.err.find("הבדיקה הסתיימה. שגיאות: "), std::string::npos) << check.err;
+  EXPECT_FALSE(fs::exists(temp_ / "zdpost1.csv"));
+  EXPECT_FALSE(fs::exists(book));
+
+  args.push_back("--strict");
+  EXPECT_EQ(Run(args).exitCode, 3);
+  args.erase(args.end() - 2);  // --strict without --check
+  const RunResult strict = Run(args);
+  EXPECT_EQ(strict.exitCode, 3) << strict.err;
+  EXPECT_EQ(strict.out, check.out);
+  EXPECT_NE(strict.err.find("הקובץ לא נכתב. שגיאות: "), std::string::npos) << strict.err;
+  EXPECT_FALSE(fs::exists(temp_ / "zdpost1.csv"));
+  EXPECT_FALSE(fs::exists(book));
+
+  auto labels = Base("labels");
+  labels.push_back("--check");
+  EXPECT_EQ(Run(labels).exitCode, 2);
 }
 
 TEST_F(CliTest, MissingCompanyFolderReportsTheAccountFaultAndFails) {
