@@ -439,7 +439,23 @@ std::string MainCard::CmdPreview_Click() {
 }
 
 std::string MainCard::cmdBuildPostIL_Click() {
-  return RunCommand([this] { return control_->CmdBuildPostIL(); });
+  const std::string produced = RunCommand([this] { return control_->CmdBuildPostIL(); });
+  if (!produced.empty()) OfferPostILFindings();
+  return produced;
+}
+
+void MainCard::OfferPostILFindings() {
+  const PreflightResult& checked = control_->lastPreflight();
+  if (checked.findings.empty()) return;
+  const std::string counts = "בבדיקת הקובץ לדואר נמצאו " + PreflightCounts(checked) + ".\n";
+  if (control_->postILSettings().OpenExcel == 1) {
+    // The workbook is open already; its findings sheet is one tab away.
+    seam_->ShowMessage(counts + "הממצאים בגיליון \"בדיקה\" של חוברת העבודה.", kTitleMessage,
+                       MsgIcon::Information);
+  } else if (seam_->AskYesNo(counts + "לפתוח את חוברת העבודה בגיליון \"בדיקה\"?", kTitleAttention,
+                             MsgIcon::Question)) {
+    control_->OpenPostILFindings();
+  }
 }
 
 void MainCard::CmdDef_Click() {

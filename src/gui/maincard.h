@@ -147,6 +147,9 @@ class MainCard : public QWidget {
   void BuildLayout();
   // Runs an output command with the other commands refused meanwhile.
   std::string RunCommand(const std::function<std::string()>& command);
+  // After the dispatch command, when its checks found anything: the counts, and the
+  // workbook opened on its findings sheet when the clerk asks for it.
+  void OfferPostILFindings();
   void SetCommandsEnabled(bool enabled);
   void CopyBox(const char* from, const char* to);
 

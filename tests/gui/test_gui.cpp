@@ -25,6 +25,7 @@
 #include "gui/dialogs.h"
 #include "gui/maincard.h"
 #include "gui/qtseam.h"
+#include "output/preflight.h"
 #include "select/picker.h"
 #include "zdrgen/generator.h"
 
@@ -525,13 +526,34 @@ TEST_F(OutputCommandTest, DispatchFileIsWrittenAndOpenedWhenAsked) {
   card_->control().postILSettings().FilePath = workbook.string();
   card_->control().postILSettings().OpenExcel = 1;
   card_->cmdBuildPostIL_Click();
-  EXPECT_TRUE(prompter_.shown.empty()) << prompter_.shown[0].text;
   EXPECT_TRUE(fs::exists(temp_.path() / "zdpost1.csv"));
   EXPECT_TRUE(fs::exists(workbook));
   ASSERT_EQ(opener_.workbooks.size(), 1u);
   EXPECT_EQ(fs::path(opener_.workbooks[0]), workbook);
   EXPECT_TRUE(Saw("מכין קובץ"));
-  EXPECT_EQ(card_->LblMessage()->text(), Q("הכנת הקובץ הסתיימה"));
+  // The generated company holds faults on purpose: the workbook is open, so the counts are
+  // told and nothing is asked.
+  const std::string counts = PreflightCounts(card_->control().lastPreflight());
+  EXPECT_EQ(card_->LblMessage()->text(), Q(("הכנת הקובץ הסתיימה. " + counts).c_str()));
+  ASSERT_EQ(prompter_.shown.size(), 1u);
+  EXPECT_EQ(prompter_.shown[0].text,
+            "בבדיקת הקובץ לדואר נמצאו " + counts + ".\nהממצאים בגיליון \"בדיקה\" של חוברת העבודה.");
+  EXPECT_EQ(prompter_.shown[0].title, "הודעה");
+}
+
+TEST_F(OutputCommandTest, DispatchFindingsOpenTheWorkbookWhenAsked) {
+  const fs::path workbook = company_.path() / "post.xlsx";
+  card_->control().postILSettings().FilePath = workbook.string();
+  for (bool yes : {false, true}) {
+    prompter_.answers = {yes};
+    card_->cmdBuildPostIL_Click();
+    ASSERT_EQ(prompter_.asked.size(), 1u);
+    EXPECT_EQ(prompter_.asked.back().title, "שימו לב");
+    EXPECT_EQ(opener_.workbooks.size(), yes ? 1u : 0u);
+    prompter_.asked.clear();
+  }
+  EXPECT_EQ(fs::path(opener_.workbooks[0]), workbook);
+  EXPECT_TRUE(prompter_.shown.empty());
 }
 
 // ---------------------------------------------------------------------------------------
