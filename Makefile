@@ -17,7 +17,8 @@ build-release: deps
 	@cmake --preset release >/dev/null
 	@cmake --build --preset release -j $(JOBS)
 
-# Writes the sample company, runs the three outputs on it into ./out and prints their paths.
+# Writes the sample company, runs the three outputs on it into ./out and prints their paths
+# and the counts of the dispatch checks.
 demo: build-release
 	@bash scripts/demo.sh build/release "$(SAMPLE)" "$(OUT)"
 

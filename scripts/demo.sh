@@ -1,7 +1,7 @@
 #!/usr/bin/env bash
 # demo.sh BUILD_DIR SAMPLE_DIR [OUT_DIR]
 # Writes the sample companies with the generator; with OUT_DIR, runs the three outputs on the
-# first company into OUT_DIR and prints their paths.
+# first company into OUT_DIR and prints their paths and the dispatch checks' counts.
 set -euo pipefail
 build="$1"; sample="$2"; out="${3:-}"
 rm -rf "$sample"
@@ -25,3 +25,8 @@ post=$("$zdrlab" post --company "$company" --settings "$settings" \
 echo "Label sheet:  $labels"
 echo "Address list: $list"
 echo "Workbook:     $post"
+# The dispatch checks' counts, from the command's last status line.
+counts=$(grep -ao 'שגיאות: [0-9]*, אזהרות: [0-9]*' "$out/post.log" | tail -n 1)
+errors=$(sed -E 's/^[^0-9]*([0-9]+).*/\1/' <<<"$counts")
+warnings=$(sed -E 's/.*[^0-9]([0-9]+)$/\1/' <<<"$counts")
+echo "Dispatch checks: $errors errors, $warnings warnings (sheet \"בדיקה\" of the workbook)"
