@@ -1,4 +1,4 @@
-// The three outputs and the workbook for 100,000 recipients.
+// The three outputs, the dispatch checks and the workbook for 100,000 recipients.
 #include <benchmark/benchmark.h>
 #include <stdlib.h>
 
@@ -9,6 +9,7 @@
 #include "control/panel.h"
 #include "import/doctypes.h"
 #include "output/output.h"
+#include "output/preflight.h"
 #include "select/select.h"
 #include "workdb/schema.h"
 
@@ -125,6 +126,17 @@ void BM_DispatchFile(benchmark::State& state) {
   state.SetItemsProcessed(state.iterations() * kRecipients);
 }
 
+// The dispatch checks over the same rows (all clean: the cost of looking, not of reporting).
+void BM_DispatchChecks(benchmark::State& state) {
+  Fixture& f = Data();
+  for (auto _ : state) {
+    const zdr::PreflightResult r = zdr::RunPreflight(f.db, static_cast<int16_t>(state.range(0)),
+                                                     f.panel, f.docTypes, "", f.seam);
+    benchmark::DoNotOptimize(r.findings.size());
+  }
+  state.SetItemsProcessed(state.iterations() * kRecipients);
+}
+
 void BM_Workbook(benchmark::State& state) {
   Fixture& f = Data();
   zdr::CreateCSV(f.Path("zdpost1.csv"), f.db, 0, f.panel, f.docTypes, "", f.post, f.seam);
@@ -138,6 +150,7 @@ BENCHMARK(BM_QueryOnly)->Unit(benchmark::kMillisecond)->Iterations(3);
 BENCHMARK(BM_LabelSheet)->Unit(benchmark::kMillisecond)->Iterations(3);
 BENCHMARK(BM_AddressList)->Unit(benchmark::kMillisecond)->Iterations(3);
 BENCHMARK(BM_DispatchFile)->Arg(0)->Arg(1)->Unit(benchmark::kMillisecond)->Iterations(3);
+BENCHMARK(BM_DispatchChecks)->Arg(0)->Arg(1)->Unit(benchmark::kMillisecond)->Iterations(3);
 BENCHMARK(BM_Workbook)->Unit(benchmark::kMillisecond)->Iterations(2);
 
 }  // namespace
