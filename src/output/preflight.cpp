@@ -72,7 +72,9 @@ std::string UncarriedCharacters(std::string_view text) {
   std::vector<char32_t> seen;
   for (size_t pos = 0; pos < text.size();) {
     const char32_t cp = NextCodePoint(text, pos);
-    if (!Uncarried(cp) || std::find(seen.begin(), seen.end(), cp) != seen.end()) continue;
+    if ((cp >= 0x20 && cp < 0x7F) || !Uncarried(cp) ||
+        std::find(seen.begin(), seen.end(), cp) != seen.end())
+      continue;
     seen.push_back(cp);
     if (seen.size() > 5) {
       out += ", ...";
@@ -113,19 +115,23 @@ struct FieldText {
   FieldText(const db::Value& v, int maxLength) {
     AppendValueText(v, books);
     AppendCsvField(v, maxLength, written);
-    std::string whole;
-    AppendCsvField(v, 0, whole);
-    if (whole.size() > written.size()) lost = whole.substr(written.size());
+    // The cleaning changes single bytes into single bytes, so what was cut is the rest of the
+    // books' text, cleaned the same way.
+    if (books.size() > written.size()) {
+      AppendCsvField(db::Value{books.substr(written.size())}, 0, lost);
+    }
   }
 };
 
 class Checker {
  public:
-  Checker(int16_t layout, bool zipCarried, PreflightResult& result)
+  Checker(int16_t layout, bool zipCarried, int64_t rows, PreflightResult& result)
       : lengths_(layout == 0 ? kPostLengths : kCourierLengths),
         layout_(layout),
         zipCarried_(zipCarried),
-        result_(result) {}
+        result_(result) {
+    firstRow_.reserve(static_cast<size_t>(rows));
+  }
 
   void Check(const db::Snapshot& rs, const RowFields& c, int64_t row) {
     row_ = row;
@@ -249,7 +255,7 @@ PreflightResult RunPreflight(const std::string& pDBFile, int16_t pFileFormat, co
   rs.MoveLast();
   const int64_t count = rs.RecordCount();
   const RowFields fields(rs);
-  Checker checker(pFileFormat, zipCarried, result);
+  Checker checker(pFileFormat, zipCarried, count, result);
   ProgressReporter progress(ui, static_cast<double>(count));
   rs.MoveFirst();
   while (!rs.AtEnd()) {
