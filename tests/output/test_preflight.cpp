@@ -1,6 +1,7 @@
 // The dispatch checks: one row per rule on a hand-made company, the layouts' differences,
 // the findings sheet and CSV, and the faults the generator plants in its sample company.
 #include <gtest/gtest.h>
+#include <unistd.h>
 
 #include <cstdlib>
 #include <map>
