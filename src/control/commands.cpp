@@ -155,6 +155,7 @@ std::string Control::CmdBuildPostIL(bool strict) {
 bool Control::CmdCheckPostIL() {
   preflight_ = {};
   try {
+    const auto lock = LockWorkFiles();
     ReadAllData(false);
     ui_.YieldToEvents();
     RunPostILChecks();
@@ -170,7 +171,9 @@ bool Control::CmdCheckPostIL() {
 bool Control::OpenPostILFindings() {
   if (lastPostWorkbook_.empty() || preflight_.findings.empty()) return false;
   try {
-    ConvertToExcel(lastPostCsv_, lastPostWorkbook_, true, ui_, preflight_.findings, true);
+    const auto lock = LockWorkFiles();  // the dispatch file is read again from the temp folder
+    ConvertToExcel(lastPostCsv_, lastPostWorkbook_, true, ui_, state_.companyPath,
+                   preflight_.findings, true);
     return true;
   } catch (const std::exception& e) {
     ui_.ShowMessage(e.what(), kTitleFault, MsgIcon::Critical);

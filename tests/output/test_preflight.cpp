@@ -214,7 +214,7 @@ TEST_F(FindingsSheetTest, DispatchSheetIsTheSameWithAndWithoutFindings) {
   for (bool open : {false, true}) {
     const std::string tag = open ? "open" : "closed";
     ConvertToExcel(csv, PathOf("plain-" + tag + ".xlsx"), open, seam);
-    ConvertToExcel(csv, PathOf("checked-" + tag + ".xlsx"), open, seam, r.findings);
+    ConvertToExcel(csv, PathOf("checked-" + tag + ".xlsx"), open, seam, {}, r.findings);
   }
   // Per pair: the dispatch sheets' bytes equal, and the sheet names of the checked workbook.
   const std::string script = PathOf("compare.py");
@@ -236,7 +236,7 @@ TEST_F(FindingsSheetTest, FindingsSheetIsRightToLeftTextAndCanOpenFirst) {
   const std::string csv = PathOf("zdpost1.csv");
   CreateCSV(csv, db, 0, panel, docTypes, "", post, seam);
   const PreflightResult r = RunPreflight(db, 0, panel, docTypes, "", seam);
-  ConvertToExcel(csv, PathOf("out.xlsx"), false, seam, r.findings, true);
+  ConvertToExcel(csv, PathOf("out.xlsx"), false, seam, {}, r.findings, true);
   const std::string script = PathOf("read.py");
   std::ofstream(script) << "import sys, openpyxl\n"
                            "wb = openpyxl.load_workbook(sys.argv[1])\n"
