@@ -9,6 +9,7 @@
 #include <QGroupBox>
 #include <QHBoxLayout>
 #include <QHeaderView>
+#include <QIntValidator>
 #include <QLabel>
 #include <QLineEdit>
 #include <QListWidget>
@@ -20,6 +21,7 @@
 #include <QVBoxLayout>
 #include <algorithm>
 #include <exception>
+#include <optional>
 #include <stdexcept>
 
 #include "control/control.h"
@@ -415,22 +417,19 @@ namespace {
 constexpr std::array<const char*, frmLabDef::kLines> kLineCaptions{
     "לכבוד", "שם כרטיס", "קוד כרטיס:", "לידי: איש קשר", "כתובת", "עיר ומיקוד", "שכונה", "טלפון"};
 
-// A whole number from 0 to 255 from a text box, as the byte conversion reads it.
-uint8_t ToByte(const QString& text) {
+constexpr int kMinFontSize = 1;
+constexpr int kMaxFontSize = 255;
+
+// The font size a box holds: a whole number from 1 to 255, or nothing.
+std::optional<uint8_t> FontSizeOf(const QString& text) {
   int64_t v = 0;
   try {
-    v = HostIntValue(FromQ(text));
+    v = HostIntValue(FromQ(text.trimmed()));
   } catch (const std::exception&) {
-    throw std::invalid_argument("ערך לא מספרי");
+    return std::nullopt;
   }
-  if (v < 0 || v > 255) throw std::invalid_argument("ערך מחוץ לתחום");
+  if (text.trimmed().isEmpty() || v < kMinFontSize || v > kMaxFontSize) return std::nullopt;
   return static_cast<uint8_t>(v);
-}
-
-uint8_t ListToByte(const QComboBox* list) {
-  const int i = list->currentIndex();
-  if (i < 0 || i > 255) throw std::invalid_argument("לא נבחר ערך ברשימה");
-  return static_cast<uint8_t>(i);
 }
 
 void SetListIndex(QComboBox* list, int index) {
@@ -464,6 +463,7 @@ frmLabDef::frmLabDef(Control& control, FileChooser& chooser, QWidget* parent)
         {QStringLiteral("Arial"), QStringLiteral("David"), QStringLiteral("Miriam")});
     txtFontSize[i] = MakeEdit(QStringLiteral("txtFontSize") + n, lines);
     txtFontSize[i]->setMaxLength(3);
+    txtFontSize[i]->setValidator(new QIntValidator(kMinFontSize, kMaxFontSize, txtFontSize[i]));
     txtFontSize[i]->setFixedWidth(50);
     txtFontSize[i]->setAlignment(Qt::AlignCenter);
     CmbWeight[i] = new QComboBox(lines);
@@ -524,6 +524,26 @@ void frmLabDef::Load() {
   }
 }
 
+QWidget* frmLabDef::FirstBadValue(std::string& why) const {
+  for (int i = 0; i < kLines; ++i) {
+    const std::string line = std::string("בשורה \"") + kLineCaptions[i] + "\"";
+    if (CmbFont[i]->currentIndex() < 0) {
+      why = "לא נבחר גופן " + line;
+      return CmbFont[i];
+    }
+    if (!FontSizeOf(txtFontSize[i]->text())) {
+      why = "גודל הגופן " + line + " צריך להיות מספר שלם מ-" + std::to_string(kMinFontSize) +
+            " עד " + std::to_string(kMaxFontSize);
+      return txtFontSize[i];
+    }
+    if (CmbWeight[i]->currentIndex() < 0) {
+      why = "לא נבחר משקל " + line;
+      return CmbWeight[i];
+    }
+  }
+  return nullptr;
+}
+
 void frmLabDef::GetSetFormLabDefs(uint8_t Action) {
   LabelSettings& s = control_.labelSettings();
   if (Action == 1) {
@@ -538,11 +558,13 @@ void frmLabDef::GetSetFormLabDefs(uint8_t Action) {
     TxtHeaderLogo->setText(ToQ(s.LabPics[0]));
     txtFooterLogo->setText(ToQ(s.LabPics[1]));
   } else if (Action == 2) {
+    std::string why;
+    if (FirstBadValue(why)) throw std::invalid_argument(why);
     for (int i = 0; i < kLines; ++i) {
       LabelLineDef& d = s.LabelDefs[i];
-      d.Font = ListToByte(CmbFont[i]);
-      d.FontSize = ToByte(txtFontSize[i]->text());
-      d.FontWeight = ListToByte(CmbWeight[i]);
+      d.Font = static_cast<uint8_t>(CmbFont[i]->currentIndex());
+      d.FontSize = *FontSizeOf(txtFontSize[i]->text());
+      d.FontWeight = static_cast<uint8_t>(CmbWeight[i]->currentIndex());
       d.FontUL = static_cast<uint8_t>(ChkUL[i]->value());
       d.FontItalic = static_cast<uint8_t>(ChkItalic[i]->value());
     }
@@ -551,16 +573,22 @@ void frmLabDef::GetSetFormLabDefs(uint8_t Action) {
   }
 }
 
-void frmLabDef::cmdOK_Click() {
-  try {
-    GetSetFormLabDefs(2);
-  } catch (...) {
+bool frmLabDef::cmdOK_Click() {
+  // A bad value keeps the dialog open on that value, with everything typed still in it.
+  std::string why;
+  if (QWidget* bad = FirstBadValue(why)) {
+    control_.ui().ShowMessage(why, kTitleError, MsgIcon::Critical);
+    bad->setFocus(Qt::OtherFocusReason);
+    if (auto* edit = qobject_cast<QLineEdit*>(bad)) edit->selectAll();
+    return false;
   }
+  GetSetFormLabDefs(2);
   try {
     SetGetRegLabelDefs(kActionSave, control_.store(), control_.labelSettings());
   } catch (...) {
   }
   accept();
+  return true;
 }
 
 void frmLabDef::cmdCancel_Click() {

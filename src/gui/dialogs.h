@@ -155,12 +155,13 @@ class frmLabDef : public QDialog {
   void ShowModal();
   // Reads the settings from the store into memory and fills the dialog.
   void Load();
-  // Action 1 fills the dialog from memory, 2 reads it into memory. Action 2 stops at the
-  // first value that is not a whole number from 0 to 255 (or a list without a choice) by
-  // throwing std::invalid_argument; what was read before it stays in memory.
+  // Action 1 fills the dialog from memory, 2 reads it into memory. Action 2 takes all or
+  // nothing: a size that is not a whole number from 1 to 255, or a list without a choice,
+  // throws std::invalid_argument and leaves memory as it was.
   void GetSetFormLabDefs(uint8_t Action);
-  // Takes the dialog into memory as far as it reads, saves, and closes.
-  void cmdOK_Click();
+  // Takes the dialog into memory, saves, and closes. A bad value is named in a message
+  // instead and the dialog stays open on it, as typed; returns false then.
+  bool cmdOK_Click();
   void cmdCancel_Click();
   // The picture buttons: 0 the top picture, 1 the bottom one.
   void CmdDir_Click(int index);
@@ -177,6 +178,9 @@ class frmLabDef : public QDialog {
   QLineEdit* txtFooterLogo;
 
  private:
+  // The first control whose value cannot be taken, with the reason; null when all can.
+  QWidget* FirstBadValue(std::string& why) const;
+
   Control& control_;
   FileChooser& chooser_;
 };
