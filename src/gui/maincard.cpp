@@ -28,7 +28,9 @@ namespace zdr::gui {
 ClickLabel::ClickLabel(const QString& text, QWidget* parent) : QWidget(parent) {
   label_ = new QLabel(text, this);
   // Looks like a link: it copies the range's start into its end.
-  label_->setStyleSheet(QStringLiteral("color: #1a4f9c; text-decoration: underline"));
+  label_->setStyleSheet(
+      QStringLiteral("QLabel { color: #1a4f9c; text-decoration: underline }"
+                     "QLabel:disabled { color: palette(mid); text-decoration: none }"));
   auto* l = new QHBoxLayout(this);
   l->setContentsMargins(0, 0, 0, 0);
   l->addWidget(label_);
@@ -46,6 +48,47 @@ void ClickLabel::mousePressEvent(QMouseEvent* event) {
 
 namespace {
 constexpr const char* kDesignedMaxLength = "designedMaxLength";
+
+// Tab follows reading order, right to left and top to bottom: in each row the check box,
+// then "from", then "to"; row after row and group after group (the accounts and the
+// documents on the right, then the ledger and the label layout); then the commands. Set
+// here once rather than left to the order the widgets happen to be created in.
+// clang-format off
+constexpr std::array kTabOrder{
+    // Accounts.
+    "ChkAccKey", "TxtFromCrd", "TxtToCrd",
+    "ChkCatCode", "txtFromSort", "txtToSort",
+    "ChkAgent", "txtAgent", "txtToAgent",
+    "chkCutOff", "CutOff1", "CutOff2", "CutOff3", "CutOff4",
+    "ChkCity", "TxtCity",
+    "ChkPhone", "txtPhone",
+    "ChkSelectAccount", "cmbInAccounts", "cmdSelectAccount",
+    // Documents.
+    "ChkDates", "cmbDocType", "cmbByDoc",
+    "TxtFromDate", "TxtToDate",
+    "txtFromRef", "txtToRef",
+    "ChkByItems",
+    "txtFromItmKey", "txtToItmKey",
+    "txtFromItmSort", "txtToItmSort",
+    "cmbAddressFrom",
+    // Ledger.
+    "ChkJournal", "txtFromJournal", "txtToJournal",
+    "chkTransType", "txtTransType",
+    "chkTransDates", "txtFromTransDate", "txtToTransDate",
+    "chkTransVDate", "txtFromTransVDate", "txtToTransVDate",
+    "chkReadTempTrans",
+    // Order and label layout.
+    "CmbSortBy", "CmbSortDir",
+    "txtRows", "txtCols",
+    "txtCopies", "txtStartFrom",
+    "ChkTitle0", "ChkTitle1", "ChkTitle2",
+    "ChkTitle3", "ChkTitle4", "ChkTitle5",
+    "ChkTitle6", "ChkTitle7", "ChkTitle8",
+    "ChkLogo0", "ChkLogo1",
+    // Commands.
+    "CmdLabPrev", "CmdPreview", "cmdBuildPostIL",
+    "CmdLabDef", "cmdPostDef", "CmdDef", "CmdConnect"};
+// clang-format on
 }  // namespace
 
 template <typename Widget>
@@ -352,12 +395,25 @@ void MainCard::BuildLayout() {
   columns->addLayout(right, 1);
   columns->addLayout(left, 1);
 
+  inputGroups_ = {accounts, documents, ledger, layoutBox};
+  SetTabOrder();
+
   auto* all = new QVBoxLayout(this);
   all->addLayout(columns, 1);
   all->addLayout(outputs);
   all->addLayout(settings);
   all->addWidget(lblMessage_);
   all->addWidget(progress_);
+}
+
+void MainCard::SetTabOrder() {
+  QWidget* previous = nullptr;
+  for (const char* name : kTabOrder) {
+    auto* w = findChild<QWidget*>(QString::fromLatin1(name));
+    if (!w) continue;
+    if (previous) QWidget::setTabOrder(previous, w);
+    previous = w;
+  }
 }
 
 // ---------------------------------------------------------------------------------------
@@ -408,14 +464,22 @@ void MainCard::WritePanel() {
 // ---------------------------------------------------------------------------------------
 // Commands
 
-void MainCard::SetCommandsEnabled(bool enabled) {
-  for (QPushButton* b : commands_) b->setEnabled(enabled);
+void MainCard::LockPanel(bool locked) {
+  if (locked) {
+    // Greyed, the inputs take no keys and no clicks, so nothing typed meanwhile is lost
+    // when the command writes the panel back; the focus comes back where it was.
+    QWidget* focus = window()->focusWidget();
+    refocus_ = focus && isAncestorOf(focus) ? focus : nullptr;
+  }
+  for (QGroupBox* g : inputGroups_) g->setEnabled(!locked);
+  for (QPushButton* b : commands_) b->setEnabled(!locked);
+  if (!locked && refocus_) refocus_->setFocus(Qt::OtherFocusReason);
 }
 
 std::string MainCard::RunCommand(const std::function<std::string()>& command) {
   if (busy_) return {};
   busy_ = true;
-  SetCommandsEnabled(false);
+  LockPanel(true);
   std::string produced;
   try {
     ReadPanel();
@@ -425,7 +489,7 @@ std::string MainCard::RunCommand(const std::function<std::string()>& command) {
   }
   // The importers may have adjusted the panel (an empty cut-off box becomes a blank).
   WritePanel();
-  SetCommandsEnabled(true);
+  LockPanel(false);
   busy_ = false;
   return produced;
 }
@@ -507,7 +571,7 @@ void MainCard::cmdPostDef_Click() {
 void MainCard::cmdSelectAccount_Click() {
   if (busy_) return;
   busy_ = true;
-  SetCommandsEnabled(false);
+  LockPanel(true);
   std::string dbPath;
   try {
     ReadPanel();
@@ -515,7 +579,7 @@ void MainCard::cmdSelectAccount_Click() {
   } catch (const std::exception& e) {
     seam_->ShowMessage(e.what(), kTitleFault, MsgIcon::Critical);
   }
-  SetCommandsEnabled(true);
+  LockPanel(false);
   busy_ = false;
   // Without an account-selection database there is nothing to pick from; its creation has
   // already said why.

@@ -7,6 +7,7 @@
 // panel reaches the store only through CmdDef.
 #pragma once
 
+#include <QPointer>
 #include <QWidget>
 #include <array>
 #include <cstdint>
@@ -20,6 +21,7 @@
 #include "workdb/value.h"
 
 class QComboBox;
+class QGroupBox;
 class QLabel;
 class QLineEdit;
 class QProgressBar;
@@ -145,12 +147,14 @@ class MainCard : public QWidget {
   QPushButton* Command(const char* name, const QString& caption);
 
   void BuildLayout();
-  // Runs an output command with the other commands refused meanwhile.
+  void SetTabOrder();
+  // Runs an output command with the panel locked meanwhile: its inputs greyed and every
+  // command refused.
   std::string RunCommand(const std::function<std::string()>& command);
   // After the dispatch command, when its checks found anything: the counts, and the
   // workbook opened on its findings sheet when the clerk asks for it.
   void OfferPostILFindings();
-  void SetCommandsEnabled(bool enabled);
+  void LockPanel(bool locked);
   void CopyBox(const char* from, const char* to);
 
   SettingsStore& store_;
@@ -174,6 +178,8 @@ class MainCard : public QWidget {
   std::array<PanelCheckBox*, 2> chkLogo_{};
   QComboBox* cmbDocType_ = nullptr;
   std::vector<QPushButton*> commands_;
+  std::vector<QGroupBox*> inputGroups_;  // every input of the panel is in one of them
+  QPointer<QWidget> refocus_;
   bool busy_ = false;
 
   std::unique_ptr<frmOpenDir> openDir_;

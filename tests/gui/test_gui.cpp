@@ -6,17 +6,20 @@
 
 #include <QApplication>
 #include <QComboBox>
+#include <QGroupBox>
 #include <QLabel>
 #include <QLineEdit>
 #include <QListWidget>
 #include <QProgressBar>
 #include <QPushButton>
 #include <QTableView>
+#include <QTest>
 #include <QTimer>
 #include <QTreeView>
 #include <deque>
 #include <filesystem>
 #include <fstream>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -425,6 +428,62 @@ TEST_F(GuiTest, CopyLabelsCopyFromIntoTo) {
   EXPECT_EQ(Text(*card, "txtToItmSort"), "9");
 }
 
+// The panel's inputs and commands that Tab stops at.
+std::vector<QWidget*> Focusable(QWidget& card) {
+  std::vector<QWidget*> out;
+  for (QWidget* w : card.findChildren<QWidget*>())
+    if ((w->focusPolicy() & Qt::TabFocus) && w->isVisibleTo(&card)) out.push_back(w);
+  return out;
+}
+
+QGroupBox* GroupOf(QWidget* w) {
+  for (QWidget* p = w->parentWidget(); p; p = p->parentWidget())
+    if (auto* g = qobject_cast<QGroupBox*>(p)) return g;
+  return nullptr;
+}
+
+TEST_F(GuiTest, TabRanBackwardsInEveryRangeRow) {
+  auto card = MakeCard();
+  card->resize(900, 700);
+  card->show();
+  QWidget* first = Find<QWidget>(*card, "ChkAccKey");
+  first->setFocus();
+  std::vector<QWidget*> visited{first};
+  for (int i = 0; i < 200; ++i) {
+    QTest::keyClick(card->focusWidget(), Qt::Key_Tab);
+    if (card->focusWidget() == first) break;
+    visited.push_back(card->focusWidget());
+  }
+  // Once round the whole panel, every stop once.
+  std::vector<QWidget*> all = Focusable(*card);
+  EXPECT_EQ(std::set<QWidget*>(visited.begin(), visited.end()),
+            std::set<QWidget*>(all.begin(), all.end()));
+  EXPECT_EQ(visited.size(), all.size());
+  EXPECT_EQ(visited.back()->objectName(), "CmdConnect");
+
+  // Reading order: the next stop is on the same line further left, or on a lower line;
+  // each group is passed through once, the commands come last.
+  std::vector<QGroupBox*> groups;
+  for (size_t i = 1; i < visited.size(); ++i) {
+    QWidget* a = visited[i - 1];
+    QWidget* b = visited[i];
+    QGroupBox* g = GroupOf(b);
+    if (groups.empty() || groups.back() != g) {
+      EXPECT_EQ(std::count(groups.begin(), groups.end(), g), 0) << FromQ(b->objectName());
+      groups.push_back(g);
+    }
+    if (GroupOf(a) != g && g != nullptr) continue;
+    const QRect ra(a->mapTo(card.get(), QPoint()), a->size());
+    const QRect rb(b->mapTo(card.get(), QPoint()), b->size());
+    const bool sameLine = rb.center().y() >= ra.top() && rb.center().y() <= ra.bottom();
+    EXPECT_TRUE(sameLine ? rb.center().x() < ra.center().x() : rb.top() > ra.center().y())
+        << FromQ(a->objectName()) << " -> " << FromQ(b->objectName());
+  }
+  EXPECT_EQ(groups.back(), nullptr);
+  EXPECT_EQ(visited[1]->objectName(), "TxtFromCrd");
+  EXPECT_EQ(visited[2]->objectName(), "TxtToCrd");
+}
+
 TEST(PanelCheckBoxTest, ClicksTurnOnAndOffAndGreyedTurnsOn) {
   App();
   PanelCheckBox box;
@@ -498,6 +557,38 @@ TEST_F(OutputCommandTest, LabelSheetIsWrittenAndOpened) {
   EXPECT_TRUE(Find<QPushButton>(*card_, "CmdLabPrev")->isEnabled());
   EXPECT_EQ(card_->ProgressFill()->value(), 0);
   EXPECT_TRUE(prompter_.shown.empty()) << prompter_.shown[0].text;
+}
+
+TEST_F(OutputCommandTest, EditsDuringACommandWereThrownAway) {
+  card_->show();
+  auto* from = Find<QLineEdit>(*card_, "TxtFromCrd");
+  auto* city = Find<QLineEdit>(*card_, "TxtCity");
+  auto* chkCity = Find<PanelCheckBox>(*card_, "ChkCity");
+  from->setFocus();
+  QTest::keyClicks(from, "100");
+  bool tried = false;
+  card_->seam().SetStatusObserver([&](const QString&) {
+    if (tried) return;
+    tried = true;
+    for (QWidget* w : Focusable(*card_)) EXPECT_FALSE(w->isEnabled()) << FromQ(w->objectName());
+    EXPECT_FALSE(Find<ClickLabel>(*card_, "lblToDate")->isEnabled());
+    QTest::keyClicks(from, "9");
+    QTest::keyClicks(city, "Haifa");
+    QTest::mouseClick(chkCity, Qt::LeftButton);
+    QTest::mouseClick(Find<ClickLabel>(*card_, "lblToDate")->label(), Qt::LeftButton);
+    // Refused at once, in sight of the clerk, not taken and then overwritten.
+    EXPECT_EQ(from->text(), "100");
+    EXPECT_EQ(city->text(), "");
+    EXPECT_EQ(chkCity->value(), 0);
+  });
+  Find<QPushButton>(*card_, "CmdLabPrev")->click();
+  EXPECT_TRUE(tried);
+  EXPECT_EQ(from->text(), "100");
+  EXPECT_EQ(Text(*card_, "TxtToDate"), "01/01/2025");
+  for (QWidget* w : Focusable(*card_)) EXPECT_TRUE(w->isEnabled()) << FromQ(w->objectName());
+  EXPECT_EQ(card_->focusWidget(), from);
+  QTest::keyClicks(from, "1");
+  EXPECT_EQ(from->text(), "1001");
 }
 
 TEST_F(OutputCommandTest, AddressListIsWrittenAndOpened) {
@@ -869,29 +960,45 @@ TEST_F(GuiTest, LabelDialogLoadsConfirmsAndCancels) {
   EXPECT_EQ(card->control().labelSettings().LabelDefs[0].FontSize, 9);
 }
 
-TEST_F(GuiTest, LabelSizeOf300StopsReadingTheDialogAtThatValue) {
+TEST_F(GuiTest, SizeOf300ClosedTheDialogAndDroppedLaterRows) {
   auto card = MakeCard();
-  frmLabDef& d = *card->labDefDialog();
-  d.Load();
-  d.txtFontSize[2]->setText("11");
-  d.CmbFont[3]->setCurrentIndex(2);
-  d.txtFontSize[3]->setText("300");
-  d.CmbWeight[3]->setCurrentIndex(2);
-  d.txtFontSize[5]->setText("16");
-  d.TxtHeaderLogo->setText("/new/top.png");
-  d.cmdOK_Click();
-  EXPECT_FALSE(d.isVisible());
+  const LabelSettings before = card->control().labelSettings();
+  WhenShown<frmLabDef>([&](frmLabDef& d) {
+    d.txtFontSize[2]->setText("11");
+    d.txtFontSize[3]->setText("300");
+    d.CmbWeight[3]->setCurrentIndex(2);
+    d.txtFontSize[5]->setText("16");
+    d.TxtHeaderLogo->setText("/new/top.png");
+    auto* ok = Find<QPushButton>(d, "cmdOK");
+    for (const char* bad : {"300", "0", ""}) {
+      d.txtFontSize[3]->setText(bad);
+      QTest::mouseClick(ok, Qt::LeftButton);
+      EXPECT_TRUE(d.isVisible()) << bad;
+      ASSERT_FALSE(prompter_.shown.empty());
+      EXPECT_EQ(prompter_.shown.back().title, "שגיאה");
+      EXPECT_NE(prompter_.shown.back().text.find("לידי: איש קשר"), std::string::npos);
+      EXPECT_EQ(d.focusWidget(), d.txtFontSize[3]);
+    }
+    // Nothing typed is lost and nothing reached memory or the store.
+    EXPECT_EQ(d.txtFontSize[5]->text(), "16");
+    EXPECT_EQ(d.TxtHeaderLogo->text(), "/new/top.png");
+    EXPECT_EQ(card->control().labelSettings().LabelDefs[2].FontSize, before.LabelDefs[2].FontSize);
+    EXPECT_TRUE(store_.Values().empty());
+    // The size box takes no letters.
+    d.txtFontSize[3]->clear();
+    QTest::keyClicks(d.txtFontSize[3], "2a5");
+    EXPECT_EQ(d.txtFontSize[3]->text(), "25");
+    QTest::mouseClick(ok, Qt::LeftButton);
+    EXPECT_FALSE(d.isVisible());
+  });
+  Find<QPushButton>(*card, "CmdLabDef")->click();
   const auto& defs = card->control().labelSettings().LabelDefs;
-  EXPECT_EQ(defs[2].FontSize, 11);
-  EXPECT_EQ(defs[3].Font, 2);
-  EXPECT_EQ(defs[3].FontSize, 9);
-  EXPECT_EQ(defs[3].FontWeight, 0);
-  EXPECT_EQ(defs[5].FontSize, 9);
-  EXPECT_EQ(card->control().labelSettings().LabPics[0], "");
-  EXPECT_EQ(Stored("LabelDef2", "FontSize"), "11");
-  EXPECT_EQ(Stored("LabelDef3", "Font"), "2");
-  EXPECT_EQ(Stored("LabelDef3", "FontSize"), "9");
-  EXPECT_EQ(Stored(kLabPicsSection, "Pic0"), "");
+  EXPECT_EQ(defs[3].FontSize, 25);
+  EXPECT_EQ(defs[3].FontWeight, 2);
+  EXPECT_EQ(defs[5].FontSize, 16);
+  EXPECT_EQ(card->control().labelSettings().LabPics[0], "/new/top.png");
+  EXPECT_EQ(Stored("LabelDef5", "FontSize"), "16");
+  EXPECT_EQ(Stored(kLabPicsSection, "Pic0"), "/new/top.png");
 }
 
 TEST_F(GuiTest, LabelPictureChooserOffersTheImageFiltersAndCancelKeepsThePath) {
