@@ -1,5 +1,6 @@
 #include "control/companies.h"
 
+#include <algorithm>
 #include <fstream>
 #include <system_error>
 
@@ -34,6 +35,18 @@ std::string ReadCompanyName(const fs::path& descriptor) {
   return std::string(TrimSpaces(ConvertSpaced(field)));
 }
 
+// Folder names as a file manager lists them: letters without regard to case, then bytes.
+bool FolderNameLess(const std::string& a, const std::string& b) {
+  const auto folded = [](std::string s) {
+    for (char& c : s)
+      if (c >= 'A' && c <= 'Z') c = static_cast<char>(c - 'A' + 'a');
+    return s;
+  };
+  const std::string fa = folded(a);
+  const std::string fb = folded(b);
+  return fa != fb ? fa < fb : a < b;
+}
+
 }  // namespace
 
 CompanyScan FindTavPaths(const std::string& pDrive) {
@@ -54,6 +67,8 @@ CompanyScan FindTavPaths(const std::string& pDrive) {
       if (name == "." || name == "..") continue;
       folders.push_back(std::move(name));
     }
+    // The listing's own order is the file system's; the clerk looks for folders by name.
+    std::sort(folders.begin(), folders.end(), FolderNameLess);
 
     for (const std::string& name : folders) {
       std::string path = base + name;

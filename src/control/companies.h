@@ -18,7 +18,8 @@ struct CompanyEntry {
 };
 
 struct CompanyScan {
-  // Every subfolder that holds a descriptor, in directory-listing order, blank names too.
+  // Every subfolder that holds a descriptor, in folder-name order (letters without regard
+  // to case), blank names too.
   std::vector<CompanyEntry> entries;
   // Empty when the scan ran to the end; otherwise the description of the failure that
   // ended it (the entries found before the failure are kept).

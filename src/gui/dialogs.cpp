@@ -126,6 +126,7 @@ frmOpenDir::frmOpenDir(Control& control, QWidget* parent) : QDialog(parent), con
 
   pathDrive_ = new QComboBox(this);
   pathDrive_->setObjectName(QStringLiteral("PathDrive"));
+  ShowAsPath(*pathDrive_);
   dirModel_ = new QFileSystemModel(this);
   dirModel_->setFilter(QDir::AllDirs | QDir::NoDotAndDotDot | QDir::Drives);
   dirModel_->setReadOnly(true);
@@ -333,6 +334,7 @@ frmLogon::frmLogon(Control& control, frmOpenDir& openDir, QWidget* parent)
   frame->setObjectName(QStringLiteral("fraStep3"));
   txtConnDatabase_ = MakeEdit(QStringLiteral("txtConnDatabase"), frame);
   txtConnDatabase_->setMinimumWidth(460);
+  ShowAsPath(*txtConnDatabase_);
   auto* open = MakeButton("cmdOpen", QStringLiteral("עיון..."), frame);
   auto* row = new QHBoxLayout(frame);
   row->addWidget(MakeLabel(QStringLiteral("מחיצה:"), frame, "lblStep3"));
@@ -485,6 +487,8 @@ frmLabDef::frmLabDef(Control& control, FileChooser& chooser, QWidget* parent)
   auto* pgrid = new QGridLayout(pictures);
   TxtHeaderLogo = MakeEdit(QStringLiteral("TxtHeaderLogo"), pictures);
   txtFooterLogo = MakeEdit(QStringLiteral("txtFooterLogo"), pictures);
+  ShowAsPath(*TxtHeaderLogo);
+  ShowAsPath(*txtFooterLogo);
   auto* dir0 = MakeButton("CmdDir0", QStringLiteral("בחירת תמונה"), pictures);
   auto* dir1 = MakeButton("CmdDir1", QStringLiteral("בחירת תמונה"), pictures);
   pgrid->addWidget(MakeLabel(QStringLiteral("תמונה עליונה:"), pictures), 0, 0);
@@ -621,6 +625,7 @@ frmPostIL::frmPostIL(Control& control, FileChooser& chooser, QWidget* parent)
   txtConfirm = MakeEdit(QStringLiteral("txtConfirm"), this);
   txtFilePath = MakeEdit(QStringLiteral("txtFilePath"), this);
   txtFilePath->setMinimumWidth(320);
+  ShowAsPath(*txtFilePath);
   auto* dir = MakeButton("CmdDir", QStringLiteral("עיון..."), this);
   ChkOpenExcel = new PanelCheckBox(QStringLiteral("לפתוח את הקובץ אוטומטית באקסל?"), this);
   ChkOpenExcel->setObjectName(QStringLiteral("ChkOpenExcel"));

@@ -4,6 +4,7 @@
 #include <QComboBox>
 #include <QDir>
 #include <QElapsedTimer>
+#include <QFileDialog>
 #include <QLabel>
 #include <QLineEdit>
 #include <QListWidget>
@@ -30,6 +31,7 @@ void SetUpApplication(QApplication& app) {
   QApplication::setApplicationName(QStringLiteral("ZDRLab"));
   app.setLayoutDirection(Qt::RightToLeft);
   app.setFont(HebrewUiFont());
+  InstallHebrewTranslations(app);
 }
 
 // Answers every question with Yes and shows nothing: the pictures need no person.
@@ -127,6 +129,7 @@ int RenderScreenshots(int& argc, char** argv, const std::string& outDir,
   labDef->Load();
   labDef->CmbWeight[1]->setCurrentIndex(2);
   labDef->txtFontSize[1]->setText(QStringLiteral("12"));
+  labDef->TxtHeaderLogo->setText(QStringLiteral("/srv/משרד/תמונות/לוגו.png"));
   ok = Save(*labDef, dir, QStringLiteral("frmLabDef")) && ok;
 
   if (!companyOverride.empty()) {
@@ -139,6 +142,16 @@ int RenderScreenshots(int& argc, char** argv, const std::string& outDir,
   frmPostIL* postIL = card->postILDialog();
   postIL->Load();
   ok = Save(*postIL, dir, QStringLiteral("frmPostIL")) && ok;
+
+  // The file chooser of the picture buttons, over the sample companies.
+  const QString start = companyOverride.empty()
+                            ? QDir::homePath()
+                            : ToQ(std::filesystem::path(companyOverride).parent_path().string());
+  QFileDialog files(labDef, QStringLiteral("בחירת תמונה"), start);
+  PrepareFileDialog(files, FilterListToQt(kImageFilter), kImageFilterPreselected);
+  files.selectFile(QStringLiteral("לוגו.jpg"));
+  files.resize(720, 440);
+  ok = Save(files, dir, QStringLiteral("fileChooser"), 1500) && ok;
   return ok ? 0 : 1;
 }
 

@@ -2,11 +2,17 @@
 
 #include <QAbstractButton>
 #include <QApplication>
+#include <QComboBox>
 #include <QDesktopServices>
 #include <QFileDialog>
 #include <QLabel>
+#include <QLibraryInfo>
+#include <QLocale>
 #include <QMessageBox>
 #include <QProgressBar>
+#include <QStyleOptionComboBox>
+#include <QStylePainter>
+#include <QTranslator>
 #include <QUrl>
 #include <algorithm>
 
@@ -22,8 +28,9 @@ std::string FromQ(const QString& text) {
 
 QFont HebrewUiFont() {
   QFont font;
-  font.setFamilies(
-      {QStringLiteral("Miriam CLM"), QStringLiteral("Simple CLM"), QStringLiteral("DejaVu Sans")});
+  // Culmus Miriam has no Latin letters: "IBM" beside a Hebrew name came out larger, in
+  // another font.
+  font.setFamilies({QStringLiteral("Simple CLM"), QStringLiteral("DejaVu Sans")});
   font.setPointSize(11);
   return font;
 }
@@ -31,6 +38,54 @@ QFont HebrewUiFont() {
 void ApplyHebrewLook(QWidget& widget) {
   widget.setLayoutDirection(Qt::RightToLeft);
   widget.setFont(HebrewUiFont());
+}
+
+namespace {
+
+// Paints a combo box's text left to right. A combo draws its text with the application's
+// direction whatever its own, so "/home/acc" showed as "home/acc/".
+class LeftToRightComboText : public QObject {
+ public:
+  using QObject::QObject;
+  bool eventFilter(QObject* watched, QEvent* event) override {
+    auto* combo = qobject_cast<QComboBox*>(watched);
+    if (event->type() != QEvent::Paint || !combo || combo->isEditable()) return false;
+    QStylePainter painter(combo);
+    painter.setLayoutDirection(Qt::LeftToRight);
+    QStyleOptionComboBox option;
+    option.initFrom(combo);
+    option.frame = true;
+    option.currentText = combo->currentText();
+    option.currentIcon = combo->itemIcon(combo->currentIndex());
+    option.iconSize = combo->iconSize();
+    const QRect field = combo->style()->subControlRect(QStyle::CC_ComboBox, &option,
+                                                       QStyle::SC_ComboBoxEditField, combo);
+    // Long paths lose their middle, as the file dialog's own list does.
+    option.currentText = option.fontMetrics.elidedText(option.currentText, Qt::ElideMiddle,
+                                                       field.width() - option.iconSize.width() - 4);
+    painter.drawComplexControl(QStyle::CC_ComboBox, option);
+    painter.drawControl(QStyle::CE_ComboBoxLabel, option);
+    return true;
+  }
+};
+
+}  // namespace
+
+void ShowAsPath(QWidget& box) {
+  box.setLayoutDirection(Qt::LeftToRight);
+  if (qobject_cast<QComboBox*>(&box)) box.installEventFilter(new LeftToRightComboText(&box));
+}
+
+bool InstallHebrewTranslations(QCoreApplication& app) {
+  const QLocale hebrew(QLocale::Hebrew, QLocale::Israel);
+  QLocale::setDefault(hebrew);
+  auto* qt = new QTranslator(&app);
+  if (!qt->load(hebrew, QStringLiteral("qtbase"), QStringLiteral("_"),
+                QLibraryInfo::path(QLibraryInfo::TranslationsPath))) {
+    delete qt;
+    return false;
+  }
+  return QCoreApplication::installTranslator(qt);
 }
 
 namespace {
@@ -82,17 +137,30 @@ bool SystemDesktopOpener::OpenWorkbook(const std::string& path) {
   return QDesktopServices::openUrl(QUrl::fromLocalFile(ToQ(path)));
 }
 
-QString QtFileChooser::ChooseOpenFile(QWidget* parent, const QString& title,
-                                      const QStringList& filters, int selectedFilter,
-                                      const QString& startPath) {
-  QFileDialog dialog(parent, title, startPath);
-  dialog.setLayoutDirection(Qt::RightToLeft);
+void PrepareFileDialog(QFileDialog& dialog, const QStringList& filters, int selectedFilter) {
+  // The desktop's own dialog would speak the desktop's language, whatever the panel's.
+  dialog.setOption(QFileDialog::DontUseNativeDialog);
+  ApplyHebrewLook(dialog);
   dialog.setAcceptMode(QFileDialog::AcceptOpen);
   dialog.setFileMode(QFileDialog::AnyFile);
   dialog.setNameFilters(filters);
   if (selectedFilter >= 0 && selectedFilter < filters.size()) {
     dialog.selectNameFilter(filters.at(selectedFilter));
   }
+  // The dialog's detail columns (type, size, date) are not all translated and do not read
+  // well right to left; names alone do.
+  dialog.setViewMode(QFileDialog::List);
+  // The folder list and the name box hold paths.
+  for (const char* name : {"lookInCombo", "fileNameEdit"}) {
+    if (auto* box = dialog.findChild<QWidget*>(QString::fromLatin1(name))) ShowAsPath(*box);
+  }
+}
+
+QString QtFileChooser::ChooseOpenFile(QWidget* parent, const QString& title,
+                                      const QStringList& filters, int selectedFilter,
+                                      const QString& startPath) {
+  QFileDialog dialog(parent, title, startPath);
+  PrepareFileDialog(dialog, filters, selectedFilter);
   if (dialog.exec() != QDialog::Accepted) return {};
   const QStringList chosen = dialog.selectedFiles();
   return chosen.isEmpty() ? QString() : chosen.first();

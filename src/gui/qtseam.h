@@ -13,6 +13,8 @@
 
 #include "control/userseam.h"
 
+class QCoreApplication;
+class QFileDialog;
 class QLabel;
 class QProgressBar;
 class QWidget;
@@ -62,13 +64,18 @@ class FileChooser {
                                  int selectedFilter, const QString& startPath) = 0;
 };
 
-// QFileDialog, right to left. The user may type a new name: the dialog does not insist on
-// an existing file (the dispatch file's path is chosen with it).
+// Qt's own file dialog (not the desktop's), right to left and in Hebrew once the Hebrew
+// translations are installed, with its paths shown left to right. The user may type a new
+// name: the dialog does not insist on an existing file (the dispatch file's path is chosen
+// with it).
 class QtFileChooser : public FileChooser {
  public:
   QString ChooseOpenFile(QWidget* parent, const QString& title, const QStringList& filters,
                          int selectedFilter, const QString& startPath) override;
 };
+
+// Sets up `dialog` as QtFileChooser shows it (the window with its pictures uses it too).
+void PrepareFileDialog(QFileDialog& dialog, const QStringList& filters, int selectedFilter);
 
 // A filter list in the common dialog's form, "Name (*.x)|*.x|Name2 (*.y)|*.y", as the
 // list of its names for a Qt file dialog.
@@ -77,11 +84,21 @@ QStringList FilterListToQt(std::string_view pipeSeparated);
 QString ToQ(std::string_view utf8);
 std::string FromQ(const QString& text);
 
-// The Hebrew user-interface font: Culmus Miriam when installed, else a sans font that
-// holds Hebrew.
+// The user-interface font: one family that holds Hebrew and Latin letters and digits alike
+// (Culmus Simple, else DejaVu Sans), so that Latin text next to Hebrew is never drawn in a
+// fallback font of another size.
 QFont HebrewUiFont();
 // Right to left with the Hebrew font, for the panel and every dialog.
 void ApplyHebrewLook(QWidget& widget);
+// A box that holds a path: paths are left-to-right text, so their separators stay in place
+// inside a right-to-left dialog.
+void ShowAsPath(QWidget& box);
+
+// Makes Hebrew the application's language: Qt's own texts (standard dialogs, the text
+// boxes' context menus) from the Qt translations installed with the system, and the
+// Hebrew locale. Returns false when the translations are not installed; Qt's texts then
+// stay in English.
+bool InstallHebrewTranslations(QCoreApplication& app);
 
 // The seam the panel hands to its Control. `status`, `progress`, `prompter` and `opener`
 // must outlive it. The progress bar's range is 0..kProgressFrameWidth.
