@@ -129,7 +129,7 @@ int RenderScreenshots(int& argc, char** argv, const std::string& outDir,
   labDef->Load();
   labDef->CmbWeight[1]->setCurrentIndex(2);
   labDef->txtFontSize[1]->setText(QStringLiteral("12"));
-  labDef->TxtHeaderLogo->setText(QStringLiteral("/srv/משרד/תמונות/לוגו.png"));
+  labDef->TxtHeaderLogo->setText(QStringLiteral("/home/משרד/logo.png"));
   ok = Save(*labDef, dir, QStringLiteral("frmLabDef")) && ok;
 
   if (!companyOverride.empty()) {

@@ -5,8 +5,10 @@
 #include <QComboBox>
 #include <QDesktopServices>
 #include <QFileDialog>
+#include <QKeyEvent>
 #include <QLabel>
 #include <QLibraryInfo>
+#include <QLineEdit>
 #include <QLocale>
 #include <QMessageBox>
 #include <QProgressBar>
@@ -74,6 +76,13 @@ class LeftToRightComboText : public QObject {
 void ShowAsPath(QWidget& box) {
   box.setLayoutDirection(Qt::LeftToRight);
   if (qobject_cast<QComboBox*>(&box)) box.installEventFilter(new LeftToRightComboText(&box));
+  if (qobject_cast<QLineEdit*>(&box)) {
+    // A text box lays its text out in the direction of the text's first letter, whatever
+    // its own: "/משרד/חברה" came out as "חברה/משרד/". The direction key (what Ctrl with
+    // the left Shift gives on Windows) is the one way to fix it left to right.
+    QKeyEvent leftToRight(QEvent::KeyPress, Qt::Key_Direction_L, Qt::NoModifier);
+    QCoreApplication::sendEvent(&box, &leftToRight);
+  }
 }
 
 bool InstallHebrewTranslations(QCoreApplication& app) {

@@ -418,16 +418,21 @@ TEST_F(GuiTest, StandardDialogsAndMenusWereInEnglish) {
             "");
   EXPECT_TRUE(seen);
 
-  // The dialogs' own path boxes.
+  // The dialogs' own path boxes read left to right, also a path of Hebrew folders.
   auto card = MakeCard();
   frmLogon logon(card->control(), *card->openDir(), card.get());
-  for (QWidget* box : {static_cast<QWidget*>(logon.txtConnDatabase()),
-                       static_cast<QWidget*>(card->labDefDialog()->TxtHeaderLogo),
-                       static_cast<QWidget*>(card->labDefDialog()->txtFooterLogo),
-                       static_cast<QWidget*>(card->postILDialog()->txtFilePath),
-                       static_cast<QWidget*>(card->openDir()->PathDrive())}) {
-    EXPECT_EQ(box->layoutDirection(), Qt::LeftToRight) << FromQ(box->objectName());
+  for (QLineEdit* box : {logon.txtConnDatabase(), card->labDefDialog()->TxtHeaderLogo,
+                         card->labDefDialog()->txtFooterLogo, card->postILDialog()->txtFilePath}) {
+    box->window()->show();
+    box->setText(Q("/משרד/חברה"));
+    const auto cursorX = [box](int at) {
+      box->setCursorPosition(at);
+      return box->inputMethodQuery(Qt::ImCursorRectangle).toRect().center().x();
+    };
+    EXPECT_LT(cursorX(0), cursorX(box->text().size())) << FromQ(box->objectName());
+    box->window()->hide();
   }
+  EXPECT_EQ(card->openDir()->PathDrive()->layoutDirection(), Qt::LeftToRight);
 }
 
 TEST_F(GuiTest, LatinFellBackToALargerFontNextToHebrew) {
