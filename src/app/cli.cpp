@@ -24,8 +24,12 @@ const char* const kUsage =
     "usage: zdrlab labels|list|post [--company DIR] [--settings FILE] [--set NAME=VALUE]... "
     "[--open]\n"
     "       zdrlab post [--check] [--strict] ...\n"
+    "       zdrlab labels --pdf FILE [--template ID] [--offset X,Y] [options as above]\n"
+    "       zdrlab calibrate --pdf FILE [--template ID] [--offset X,Y] [--settings FILE]\n"
+    "  labels  the label sheet zdrlab1.htm; with --pdf, the sheet as PDF on label stock ID\n"
+    "          (default: the stock the settings keep, a4-3x8-70x37), moved by X,Y mm\n"
+    "  calibrate  the calibration page of a label stock as PDF\n"
     "  (each option's value may also follow an equals sign: --set=NAME=VALUE)\n"
-    "  labels  the label sheet zdrlab1.htm\n"
     "  list    the address list zdrlab2.htm\n"
     "  post    the dispatch file zdpost1.csv and its workbook (FilePath), the rows' findings\n"
     "          on its sheet \"בדיקה\"\n"
@@ -137,7 +141,7 @@ void ApplySet(Control& control, const std::string& name, const std::string& type
 }  // namespace
 
 bool IsCliCommand(const std::string& word) {
-  return word == "labels" || word == "list" || word == "post";
+  return word == "labels" || word == "list" || word == "post" || word == "calibrate";
 }
 
 int RunCli(const std::vector<std::string>& args, SettingsStore& defaultStore) {
@@ -149,6 +153,8 @@ int RunCli(const std::vector<std::string>& args, SettingsStore& defaultStore) {
   std::optional<std::string> company, settingsFile;
   std::vector<std::pair<std::string, std::string>> sets;
   bool open = false, check = false, strict = false;
+  std::optional<std::string> pdf, stockId;
+  std::optional<StockOffset> offset;
   for (size_t i = 1; i < args.size(); ++i) {
     // "--name=value" is "--name value".
     std::string a = args[i];
@@ -179,6 +185,17 @@ int RunCli(const std::vector<std::string>& args, SettingsStore& defaultStore) {
         open = true;
       } else if ((a == "--check" || a == "--strict") && command == "post" && !inlineValue) {
         (a == "--check" ? check : strict) = true;
+      } else if (a == "--pdf" && (command == "labels" || command == "calibrate")) {
+        pdf = needValue("--pdf");
+        if (pdf->empty()) throw std::invalid_argument("--pdf needs a file name");
+      } else if (a == "--template" && (command == "labels" || command == "calibrate")) {
+        stockId = needValue("--template");
+      } else if (a == "--offset" && (command == "labels" || command == "calibrate")) {
+        const std::string& xy = needValue("--offset");
+        offset = ParseStockOffset(xy);
+        if (!offset)
+          throw std::invalid_argument(
+              "--offset takes X,Y in mm, each -10 to 10 in steps of 0.1, not " + xy);
       } else {
         throw std::invalid_argument("unknown option " + a);
       }
@@ -195,6 +212,15 @@ int RunCli(const std::vector<std::string>& args, SettingsStore& defaultStore) {
       return 2;
     }
   }
+  if (command == "calibrate" && !pdf) {
+    std::fprintf(stderr, "zdrlab: calibrate needs --pdf FILE\n%s", kUsage);
+    return 2;
+  }
+  if ((stockId || offset) && !pdf) {
+    std::fprintf(stderr, "zdrlab: --template and --offset go with --pdf FILE\n%s", kUsage);
+    return 2;
+  }
+
   std::unique_ptr<SettingsStore> fileStore;
   if (settingsFile) fileStore = std::make_unique<QtSettingsStore>(*settingsFile);
   SettingsStore& store = fileStore ? *fileStore : defaultStore;
@@ -217,8 +243,20 @@ int RunCli(const std::vector<std::string>& args, SettingsStore& defaultStore) {
     std::cout << FindingsCsv(control.lastPreflight()) << std::flush;
     return strict && control.lastPreflight().errors > 0 ? 3 : 0;
   }
+  if (stockId && !FindLabelStock(store, *stockId)) {
+    std::string known;
+    for (const LabelStock& s : AvailableLabelStocks(store)) known += " " + s.id;
+    std::fprintf(stderr, "zdrlab: unknown label stock %s; known:%s\n", stockId->c_str(),
+                 known.c_str());
+    return 2;
+  }
+
   std::string produced;
-  if (command == "labels") {
+  if (command == "calibrate") {
+    produced = control.CmdCalibrate(*pdf, stockId.value_or(""), offset);
+  } else if (command == "labels" && pdf) {
+    produced = control.CmdLabPdf(*pdf, stockId.value_or(""), offset);
+  } else if (command == "labels") {
     produced = control.CmdLabPrev();
   } else if (command == "list") {
     produced = control.CmdPreview();

@@ -81,6 +81,7 @@ static std::string RunPageCommand(Control& control, const char* fileName, WriteP
 }
 
 std::string Control::CmdLabPrev() {
+  if (labelPdf_.Output == 1) return CmdLabPdf(TempFile("zdrlab1.pdf"));
   return RunPageCommand(*this, "zdrlab1.htm", [this](const std::string& path) {
     CreateLabFile(path, state_.workDbPath, panel_, docTypes_, state_.selectDbPath, labels_, ui_);
   });

@@ -33,6 +33,10 @@ void Control::Initialize() {
     SetGetRegPostILDefs(2, store_, postIL_);
   } catch (const std::exception&) {
   }
+  try {
+    SetGetRegLabelPdf(2, store_, labelPdf_);
+  } catch (const std::exception&) {
+  }
   state_.selectDbPath.clear();
 }
 

@@ -5,6 +5,7 @@
 
 #include <cstdint>
 #include <memory>
+#include <optional>
 #include <string>
 
 #include "control/panel.h"
@@ -44,6 +45,8 @@ class Control {
 
   // The three output commands. Each returns the path of the file it produced, or an empty
   // string when it failed (the failure has been shown through the seam).
+  // CmdLabPrev gives the HTML sheet, or the PDF on stock (zdrlab1.pdf in the temporary
+  // folder) when the label settings ask for it.
   std::string CmdLabPrev();
   std::string CmdPreview();
   // The dispatch command checks the recipient rows before it writes them (RunPreflight),
@@ -65,6 +68,17 @@ class Control {
   // or it failed (shown through the seam).
   bool OpenPostILFindings();
 
+  // The label sheet as PDF at `path` on the stock named `stockId` (empty: the one the
+  // settings keep), moved by `offset` (nothing: the stock's own offset, else the user's).
+  // The finished file goes to the desktop's viewer. Returns `path`, or an empty string on
+  // failure (shown through the seam).
+  std::string CmdLabPdf(const std::string& path, const std::string& stockId = "",
+                        std::optional<StockOffset> offset = std::nullopt);
+
+  // The calibration page of a stock, as CmdLabPdf chooses stock and offset. Reads no data.
+  std::string CmdCalibrate(const std::string& path, const std::string& stockId = "",
+                           std::optional<StockOffset> offset = std::nullopt);
+
   // The account picker flow up to showing the picker: asks whether to rescan when the
   // accounts were scanned before, scans when needed, and records the picker sort index.
   // Returns the account-selection database path the picker should show.
@@ -76,6 +90,7 @@ class Control {
   const DocTypeTable& docTypes() const { return docTypes_; }
   LabelSettings& labelSettings() { return labels_; }
   PostILSettings& postILSettings() { return postIL_; }
+  LabelPdfSettings& labelPdfSettings() { return labelPdf_; }
   SettingsStore& store() { return store_; }
   UserSeam& ui() { return ui_; }
 
@@ -92,6 +107,7 @@ class Control {
   PostILSettings postIL_;
   PreflightResult preflight_;
   std::string lastPostCsv_, lastPostWorkbook_;  // of the last dispatch command that wrote
+  LabelPdfSettings labelPdf_;
 };
 
 }  // namespace zdr

@@ -1,5 +1,6 @@
 #include "control/settings.h"
 
+#include <algorithm>
 #include <charconv>
 #include <cstdlib>
 #include <exception>
@@ -284,6 +285,175 @@ void SetGetRegPostILDefs(uint8_t action, SettingsStore& store, PostILSettings& p
     LoadInt16(store, kPostILSection, "OpenExcel", postIL.OpenExcel);
     LoadInt16(store, kPostILSection, "FileFormat", postIL.FileFormat);
   }
+}
+
+namespace {
+
+std::string StockSection(std::string_view id) {
+  return "LabelStock." + std::string(id);
+}
+
+std::vector<std::string> UserStockIds(SettingsStore& store) {
+  std::vector<std::string> ids;
+  const std::string list = store.Get(kSettingsApp, kLabelStocksSection, "Ids", "");
+  size_t from = 0;
+  while (from <= list.size()) {
+    const size_t semi = std::min(list.find(';', from), list.size());
+    if (semi > from) {
+      std::string id = list.substr(from, semi - from);
+      if (std::find(ids.begin(), ids.end(), id) == ids.end()) ids.push_back(std::move(id));
+    }
+    from = semi + 1;
+  }
+  return ids;
+}
+
+void SaveUserStockIds(SettingsStore& store, const std::vector<std::string>& ids) {
+  std::string list;
+  for (const auto& id : ids) list += (list.empty() ? "" : ";") + id;
+  store.Save(kSettingsApp, kLabelStocksSection, "Ids", list);
+}
+
+std::optional<LabelStock> LoadUserStock(SettingsStore& store, const std::string& id) {
+  const std::string section = StockSection(id);
+  LabelStock s;
+  s.id = id;
+  s.name = store.Get(kSettingsApp, section, "Name", id);
+  const std::pair<const char*, double*> sizes[] = {
+      {"PageWidth", &s.pageWidth}, {"PageHeight", &s.pageHeight}, {"Top", &s.top},
+      {"Side", &s.side},           {"LabelWidth", &s.labelWidth}, {"LabelHeight", &s.labelHeight},
+      {"PitchX", &s.pitchX},       {"PitchY", &s.pitchY},         {"Padding", &s.padding}};
+  for (const auto& [key, field] : sizes) {
+    const auto v = ParseMm(store.Get(kSettingsApp, section, key, ""));
+    if (!v) return std::nullopt;
+    *field = *v;
+  }
+  const auto rows = ParseInRange(store.Get(kSettingsApp, section, "Rows", ""), 1, 100);
+  const auto cols = ParseInRange(store.Get(kSettingsApp, section, "Cols", ""), 1, 100);
+  if (!rows || !cols) return std::nullopt;
+  s.rows = static_cast<int>(*rows);
+  s.cols = static_cast<int>(*cols);
+  if (!LabelStockProblem(s).empty() || FindShippedStock(s.id)) return std::nullopt;
+  return s;
+}
+
+std::optional<double> LoadOffsetMm(SettingsStore& store, std::string_view section,
+                                   std::string_view key, std::string_view defaultValue) {
+  const auto v = ParseMm(store.Get(kSettingsApp, section, key, defaultValue));
+  return v ? CheckedOffsetMm(*v) : std::nullopt;
+}
+
+}  // namespace
+
+void SetGetRegLabelPdf(uint8_t action, SettingsStore& store, LabelPdfSettings& pdf) {
+  if (action == kActionSave) {
+    SaveValue(store, kLabelPdfSection, "Template", pdf.Template);
+    SaveValue(store, kLabelPdfSection, "OffsetX", FormatMm(pdf.Offset.x));
+    SaveValue(store, kLabelPdfSection, "OffsetY", FormatMm(pdf.Offset.y));
+    SaveValue(store, kLabelPdfSection, "Output", std::to_string(pdf.Output));
+  } else if (action == kActionLoad) {
+    IgnoringErrors([&] {
+      std::string id = store.Get(kSettingsApp, kLabelPdfSection, "Template", kDefaultStockId);
+      if (!id.empty()) pdf.Template = std::move(id);
+    });
+    IgnoringErrors([&] {
+      if (const auto x = LoadOffsetMm(store, kLabelPdfSection, "OffsetX", "0")) pdf.Offset.x = *x;
+    });
+    IgnoringErrors([&] {
+      if (const auto y = LoadOffsetMm(store, kLabelPdfSection, "OffsetY", "0")) pdf.Offset.y = *y;
+    });
+    IgnoringErrors([&] {
+      const auto v = ParseInRange(store.Get(kSettingsApp, kLabelPdfSection, "Output", "0"), 0, 1);
+      if (v) pdf.Output = static_cast<int16_t>(*v);
+    });
+  }
+}
+
+std::vector<LabelStock> LoadUserStocks(SettingsStore& store) {
+  std::vector<LabelStock> stocks;
+  for (const std::string& id : UserStockIds(store)) {
+    if (auto s = LoadUserStock(store, id)) stocks.push_back(std::move(*s));
+  }
+  return stocks;
+}
+
+void SaveUserStock(SettingsStore& store, const LabelStock& stock) {
+  const std::string problem = LabelStockProblem(stock);
+  if (!problem.empty()) throw std::invalid_argument(problem);
+  if (FindShippedStock(stock.id))
+    throw std::invalid_argument("השם " + stock.id + " שמור לתבנית מובנית; בחרו שם אחר");
+  const std::string section = StockSection(stock.id);
+  store.Save(kSettingsApp, section, "Name", stock.name.empty() ? stock.id : stock.name);
+  const std::pair<const char*, double> sizes[] = {{"PageWidth", stock.pageWidth},
+                                                  {"PageHeight", stock.pageHeight},
+                                                  {"Top", stock.top},
+                                                  {"Side", stock.side},
+                                                  {"LabelWidth", stock.labelWidth},
+                                                  {"LabelHeight", stock.labelHeight},
+                                                  {"PitchX", stock.pitchX},
+                                                  {"PitchY", stock.pitchY},
+                                                  {"Padding", stock.padding}};
+  for (const auto& [key, value] : sizes) store.Save(kSettingsApp, section, key, FormatMm(value));
+  store.Save(kSettingsApp, section, "Rows", std::to_string(stock.rows));
+  store.Save(kSettingsApp, section, "Cols", std::to_string(stock.cols));
+  std::vector<std::string> ids = UserStockIds(store);
+  if (std::find(ids.begin(), ids.end(), stock.id) == ids.end()) {
+    ids.push_back(stock.id);
+    SaveUserStockIds(store, ids);
+  }
+}
+
+void RemoveUserStock(SettingsStore& store, std::string_view id) {
+  std::vector<std::string> ids = UserStockIds(store);
+  const auto it = std::find(ids.begin(), ids.end(), id);
+  if (it == ids.end()) return;
+  ids.erase(it);
+  SaveUserStockIds(store, ids);
+}
+
+std::vector<LabelStock> AvailableLabelStocks(SettingsStore& store) {
+  std::vector<LabelStock> all = ShippedLabelStocks();
+  for (auto& s : LoadUserStocks(store)) all.push_back(std::move(s));
+  return all;
+}
+
+std::optional<LabelStock> FindLabelStock(SettingsStore& store, std::string_view id) {
+  if (auto shipped = FindShippedStock(id)) return shipped;
+  for (const std::string& user : UserStockIds(store)) {
+    if (user == id) return LoadUserStock(store, user);
+  }
+  return std::nullopt;
+}
+
+std::optional<StockOffset> LoadStockOffset(SettingsStore& store, std::string_view id) {
+  const std::string section = StockSection(id);
+  const auto x = LoadOffsetMm(store, section, "OffsetX", "");
+  const auto y = LoadOffsetMm(store, section, "OffsetY", "");
+  if (!x || !y) return std::nullopt;
+  return StockOffset{*x, *y};
+}
+
+void SaveStockOffset(SettingsStore& store, std::string_view id,
+                     const std::optional<StockOffset>& offset) {
+  const std::string section = StockSection(id);
+  if (!offset) {
+    store.Save(kSettingsApp, section, "OffsetX", "");
+    store.Save(kSettingsApp, section, "OffsetY", "");
+    return;
+  }
+  if (!CheckedOffsetMm(offset->x) || !CheckedOffsetMm(offset->y))
+    throw std::invalid_argument("ההיסט חייב להיות בין -10 ל-10 מ\"מ, בצעדים של 0.1");
+  store.Save(kSettingsApp, section, "OffsetX", FormatMm(offset->x));
+  store.Save(kSettingsApp, section, "OffsetY", FormatMm(offset->y));
+}
+
+StockOffset EffectiveStockOffset(SettingsStore& store, const LabelPdfSettings& pdf,
+                                 std::string_view id) {
+  try {
+    if (auto own = LoadStockOffset(store, id)) return *own;
+  } catch (const std::exception&) {
+  }
+  return pdf.Offset;
 }
 
 }  // namespace zdr

@@ -7,6 +7,7 @@
 
 #include <cstdint>
 #include <map>
+#include <optional>
 #include <stdexcept>
 #include <string>
 #include <string_view>
@@ -23,6 +24,8 @@ inline constexpr std::string_view kParamsSection = "Params";
 inline constexpr std::string_view kConnDataBaseKey = "ConnDataBase";
 inline constexpr std::string_view kLabPicsSection = "LabPics";
 inline constexpr std::string_view kPostILSection = "PostIL";
+inline constexpr std::string_view kLabelPdfSection = "LabelPdf";
+inline constexpr std::string_view kLabelStocksSection = "LabelStocks";
 
 inline constexpr uint8_t kActionSave = 1;
 inline constexpr uint8_t kActionLoad = 2;
@@ -163,5 +166,47 @@ void SetGetRegLabelDefs(uint8_t action, SettingsStore& store, LabelSettings& lab
 // are ignored value by value: a stored integer that is not a 16-bit whole number leaves
 // the old one.
 void SetGetRegPostILDefs(uint8_t action, SettingsStore& store, PostILSettings& postIL);
+
+// Saves or loads how the label command prints: section LabelPdf, keys Template (default
+// a4-3x8-70x37), OffsetX and OffsetY (millimetres, default 0) and Output (0 the HTML
+// sheet, 1 the PDF). Errors are ignored value by value: an offset that is not a number
+// within +-10 on a step of 0.1, or an output other than 0 or 1, leaves the old value.
+void SetGetRegLabelPdf(uint8_t action, SettingsStore& store, LabelPdfSettings& pdf);
+
+// The user's own label stocks. Section LabelStocks, key Ids lists their ids separated by
+// ";"; each stock is kept in section "LabelStock." + id under the keys Name, PageWidth,
+// PageHeight, Top, Side, LabelWidth, LabelHeight, PitchX, PitchY, Rows, Cols, Padding.
+// A stock whose values are missing or unusable is left out; so is one that takes a
+// shipped stock's id.
+std::vector<LabelStock> LoadUserStocks(SettingsStore& store);
+
+// Adds or replaces a user stock. Throws std::invalid_argument (Hebrew) for a stock that
+// LabelStockProblem refuses or that takes a shipped stock's id; SettingsStoreError when
+// the store cannot be written.
+void SaveUserStock(SettingsStore& store, const LabelStock& stock);
+
+// Drops a user stock from the list (its values stay behind, unused).
+void RemoveUserStock(SettingsStore& store, std::string_view id);
+
+// The shipped stocks, then the user's.
+std::vector<LabelStock> AvailableLabelStocks(SettingsStore& store);
+
+// The stock named `id` among AvailableLabelStocks, or nothing.
+std::optional<LabelStock> FindLabelStock(SettingsStore& store, std::string_view id);
+
+// A stock's own offset (keys OffsetX and OffsetY of section "LabelStock." + id), when both
+// are kept and valid.
+std::optional<StockOffset> LoadStockOffset(SettingsStore& store, std::string_view id);
+
+// Keeps a stock's own offset, or with nothing clears it (empty values). Throws
+// std::invalid_argument for an invalid offset, SettingsStoreError when the store cannot be
+// written.
+void SaveStockOffset(SettingsStore& store, std::string_view id,
+                     const std::optional<StockOffset>& offset);
+
+// The offset that labels on stock `id` print with: the stock's own when it has one, else
+// the user's.
+StockOffset EffectiveStockOffset(SettingsStore& store, const LabelPdfSettings& pdf,
+                                 std::string_view id);
 
 }  // namespace zdr

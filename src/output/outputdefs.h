@@ -5,6 +5,8 @@
 #include <cstdint>
 #include <string>
 
+#include "output/labelstock.h"
+
 namespace zdr {
 
 struct LabelLineDef {
@@ -24,6 +26,13 @@ struct PostILSettings {
   std::string Service, Weight, Confirm, FilePath;  // UTF-8
   int16_t OpenExcel = 0;                           // 1: open the workbook when done
   int16_t FileFormat = 0;  // 0 "דואר ישראל", 1 "הובלות עם שחר"
+};
+
+// How the label command prints, and on which stock.
+struct LabelPdfSettings {
+  std::string Template = std::string(kDefaultStockId);  // a stock id
+  StockOffset Offset;                                   // the user's printer offset
+  int16_t Output = 0;                                   // 0 the HTML sheet, 1 the PDF on stock
 };
 
 inline constexpr std::array<const char*, 2> kFileFormatEntries{"דואר ישראל", "הובלות עם שחר"};

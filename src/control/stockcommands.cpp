@@ -1,0 +1,65 @@
+// The label sheet on stock as PDF and the stock's calibration page.
+#include <exception>
+#include <stdexcept>
+
+#include "control/control.h"
+#include "control/settings.h"
+#include "output/output.h"
+#include "output/pdflabels.h"
+
+namespace zdr {
+namespace {
+
+// The stock and offset a PDF command prints with.
+struct StockChoice {
+  LabelStock stock;
+  StockOffset offset;
+};
+
+StockChoice ChooseStock(SettingsStore& store, const LabelPdfSettings& pdf,
+                        const std::string& stockId, const std::optional<StockOffset>& offset) {
+  const std::string id = stockId.empty() ? pdf.Template : stockId;
+  std::optional<LabelStock> stock = FindLabelStock(store, id);
+  if (!stock) throw std::runtime_error("תבנית המדבקות \"" + id + "\" אינה מוכרת");
+  return {*stock, offset ? *offset : EffectiveStockOffset(store, pdf, stock->id)};
+}
+
+// The desktop's program for the file's type shows it: for a PDF, the PDF viewer.
+void OpenPdf(UserSeam& ui, const std::string& path) {
+  if (!ui.OpenInBrowser(path)) throw std::runtime_error("לא ניתן לפתוח את הקובץ " + path);
+}
+
+}  // namespace
+
+std::string Control::CmdLabPdf(const std::string& path, const std::string& stockId,
+                               std::optional<StockOffset> offset) {
+  try {
+    const StockChoice choice = ChooseStock(store_, labelPdf_, stockId, offset);
+    ReadAllData(true);
+    ui_.YieldToEvents();
+    ui_.SetStatus("מכין רשימה");
+    CreateLabPdf(path, state_.workDbPath, panel_, docTypes_, state_.selectDbPath, labels_,
+                 choice.stock, choice.offset, ui_);
+    OpenPdf(ui_, path);
+    ui_.SetStatus("הכנת הרשימה הסתיימה");
+    return path;
+  } catch (const std::exception& e) {
+    ui_.ShowMessage(e.what(), kTitleFault, MsgIcon::Critical);
+    return "";
+  }
+}
+
+std::string Control::CmdCalibrate(const std::string& path, const std::string& stockId,
+                                  std::optional<StockOffset> offset) {
+  try {
+    const StockChoice choice = ChooseStock(store_, labelPdf_, stockId, offset);
+    CreateCalibrationPdf(path, choice.stock, choice.offset);
+    OpenPdf(ui_, path);
+    return path;
+  } catch (const std::exception& e) {
+    ui_.ShowMessage(e.what(), kTitleFault, MsgIcon::Critical);
+    return "";
+  }
+}
+
+}  // namespace zdr

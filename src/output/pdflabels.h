@@ -1,0 +1,52 @@
+// Label sheets as PDF on real label stock, and the calibration page.
+//
+// Geometry is exact in millimetres: a label's text starts `padding` inside its box (the
+// right edge for right-to-left text, the top edge for the first line), wherever the stock
+// places the box, moved by the offset. The label holds the lines of the HTML sheet, in the
+// same order and with the same switches, each in its line's font, size, weight, italic
+// and underline; the top and bottom pictures (PNG or JPEG) above and below them. Text is
+// shaped and laid out right to left (pango, HarfBuzz and fribidi), and the PDF's text reads
+// back in logical order. A line too wide for its label shrinks down to kMinLabelPointSize,
+// then ends in an ellipsis; lines too tall together shrink alike, and what still does not
+// fit is left out (a message says on how many labels). Nothing is drawn outside a label's
+// box.
+//
+// The file is written beside its target under a temporary name and renamed over it when
+// complete, so an existing file (or a link in its place) is replaced, never written
+// through, and a failed run leaves the old file as it was.
+//
+// Failures throw OutputError (Hebrew description): an unusable stock, no labels to print
+// (no recipients, or copies 0), a file that cannot be written; db::EngineError for the
+// database or statement.
+#pragma once
+
+#include <string>
+
+#include "control/panel.h"
+#include "control/userseam.h"
+#include "import/doctypes.h"
+#include "output/labelstock.h"
+#include "output/outputdefs.h"
+
+namespace zdr {
+
+inline constexpr double kMinLabelPointSize = 5.0;
+
+// The label sheet as PDF on `stock`: the recipients of the panel's selection in query
+// order, each on `txtCopies` consecutive labels from position `txtStartFrom` of the first
+// sheet (positions below 1 mean the first). One page per sheet; the page count is the HTML
+// sheet's page count with the stock's rows and columns. The panel's rows and columns are
+// not used. Progress goes through the seam.
+void CreateLabPdf(const std::string& pFileName, const std::string& pDBFile, const Panel& panel,
+                  const DocTypeTable& docTypes, const std::string& selectDbPath,
+                  const LabelSettings& labels, const LabelStock& stock, StockOffset offset,
+                  UserSeam& ui);
+
+// One calibration page for `stock`, moved by `offset` as labels would be: every label's
+// outline with a cross on each corner, a millimetre scale along the page's top and right
+// edges, and scales from -10 to +10 mm across the first label's right and top edges for
+// reading the offset against a sheet of stock held behind the page.
+void CreateCalibrationPdf(const std::string& pFileName, const LabelStock& stock,
+                          StockOffset offset);
+
+}  // namespace zdr

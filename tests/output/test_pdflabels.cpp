@@ -1,0 +1,303 @@
+// Label sheets on stock as PDF, read back with poppler's pdftotext: where every label's text
+// lands, that the offset moves it exactly, the page count, and the text in reading order.
+#include <gtest/gtest.h>
+#include <sys/wait.h>
+
+#include <array>
+#include <cmath>
+#include <cstdio>
+#include <cstring>
+#include <regex>
+
+#include "output/labelstock.h"
+#include "output/outputtest.h"
+#include "output/pdflabels.h"
+
+namespace zdr::testing {
+namespace {
+
+constexpr double kMm = 72.0 / 25.4;
+
+struct Word {
+  double xMin, yMin, xMax, yMax;  // millimetres from the page's top-left corner
+  std::string text;
+};
+using Page = std::vector<Word>;
+
+std::string Capture(const std::string& command) {
+  std::string out;
+  FILE* pipe = ::popen(command.c_str(), "r");
+  if (pipe == nullptr) return out;
+  std::array<char, 65536> buf;
+  size_t n;
+  while ((n = std::fread(buf.data(), 1, buf.size(), pipe)) > 0) out.append(buf.data(), n);
+  ::pclose(pipe);
+  return out;
+}
+
+std::string Unescape(std::string s) {
+  const std::pair<const char*, const char*> entities[] = {
+      {"&quot;", "\""}, {"&lt;", "<"}, {"&gt;", ">"}, {"&apos;", "'"}, {"&amp;", "&"}};
+  for (const auto& [from, to] : entities) {
+    for (size_t at = s.find(from); at != std::string::npos; at = s.find(from, at + 1)) {
+      s.replace(at, std::strlen(from), to);
+    }
+  }
+  return s;
+}
+
+// Every page of the PDF with its words, as pdftotext -bbox finds them.
+std::vector<Page> Words(const std::string& pdf) {
+  const std::string html = Capture("pdftotext -bbox '" + pdf + "' - 2>/dev/null");
+  std::vector<Page> pages;
+  static const std::regex word(
+      "<word xMin=\"([-0-9.]+)\" yMin=\"([-0-9.]+)\" xMax=\"([-0-9.]+)\" yMax=\"([-0-9.]+)\">"
+      "([^<]*)</word>");
+  size_t at = html.find("<page ");
+  while (at != std::string::npos) {
+    const size_t next = html.find("<page ", at + 1);
+    const std::string page = html.substr(at, next == std::string::npos ? next : next - at);
+    Page words;
+    for (std::sregex_iterator it(page.begin(), page.end(), word), end; it != end; ++it) {
+      const auto& m = *it;
+      words.push_back({std::stod(m[1]) / kMm, std::stod(m[2]) / kMm, std::stod(m[3]) / kMm,
+                       std::stod(m[4]) / kMm, Unescape(m[5])});
+    }
+    pages.push_back(std::move(words));
+    at = next;
+  }
+  return pages;
+}
+
+// The text of each page in reading order, its lines joined by line feeds, without blank
+// lines and the direction marks pdftotext adds.
+std::vector<std::string> PageTexts(const std::string& pdf) {
+  std::string text = Capture("pdftotext -enc UTF-8 '" + pdf + "' - 2>/dev/null");
+  for (const char* mark : {"\u202A", "\u202B", "\u202C", "\u202D", "\u202E"}) {
+    for (size_t at = text.find(mark); at != std::string::npos; at = text.find(mark)) {
+      text.erase(at, std::strlen(mark));
+    }
+  }
+  std::vector<std::string> pages(1);
+  size_t from = 0;
+  while (from < text.size()) {
+    const size_t end = std::min(text.find_first_of("\n\f", from), text.size());
+    if (end > from)
+      pages.back() += (pages.back().empty() ? "" : "\n") + text.substr(from, end - from);
+    if (end < text.size() && text[end] == '\f') pages.emplace_back();
+    from = end + 1;
+  }
+  pages.pop_back();  // after the last form feed
+  return pages;
+}
+
+bool Inside(const Word& w, const LabelBox& b, double slack = 0.01) {
+  return w.xMin >= b.x - slack && w.xMax <= b.x + b.width + slack && w.yMin >= b.y - slack &&
+         w.yMax <= b.y + b.height + slack;
+}
+
+std::vector<Word> WordsIn(const Page& page, const LabelBox& b) {
+  std::vector<Word> in;
+  for (const Word& w : page) {
+    const double cx = (w.xMin + w.xMax) / 2, cy = (w.yMin + w.yMax) / 2;
+    if (cx > b.x && cx < b.x + b.width && cy > b.y && cy < b.y + b.height) in.push_back(w);
+  }
+  return in;
+}
+
+AccountRow Named(const std::string& key, const std::string& name) {
+  AccountRow row;
+  row.key = key;
+  row.name = name;
+  return row;
+}
+
+class PdfLabelsTest : public OutputTest {
+ protected:
+  void SetUp() override {
+    OutputTest::SetUp();
+    panel.ChkTitle[0] = 1;  // "לכבוד" first: every label starts with the same line
+    panel.ChkTitle[1] = 1;
+    panel.ChkTitle[4] = 1;
+    panel.ChkTitle[5] = 1;
+    panel.ChkTitle[8] = 1;
+  }
+
+  std::string Write(const std::string& db, const LabelStock& stock, StockOffset offset,
+                    const std::string& name = "labels.pdf") {
+    const std::string path = PathOf(name);
+    CreateLabPdf(path, db, panel, docTypes, "", labels, stock, offset, seam);
+    return path;
+  }
+};
+
+// Every shipped stock, on every page: the first line of each label starts at the padding
+// from its box's right and top edges, no word leaves its box, and the offset moves every
+// word by exactly its amount.
+TEST_F(PdfLabelsTest, FirstLineStartsAtThePaddingOnEveryStockAndPage) {
+  for (const LabelStock& stock : ShippedLabelStocks()) {
+    SCOPED_TRACE(stock.id);
+    const int perPage = stock.LabelsPerPage();
+    const int count = perPage + 2;  // a full sheet and two labels on the next
+    const size_t sheets = (count + perPage - 1) / perPage;
+    const std::string db = BuildDb(NumberedAccounts(count));
+    const StockOffset offset{1.5, -2.3};
+    const auto plain = Words(Write(db, stock, {}, "plain.pdf"));
+    const auto moved = Words(Write(db, stock, offset, "moved.pdf"));
+    ASSERT_EQ(plain.size(), sheets);
+    ASSERT_EQ(moved.size(), sheets);
+    for (int label = 0; label < count; ++label) {
+      const size_t page = label / perPage;
+      const int position = label % perPage + 1;
+      const LabelBox box = StockLabelBox(stock, position, offset);
+      const auto words = WordsIn(moved[page], box);
+      ASSERT_FALSE(words.empty()) << "label " << label;
+      double top = 1e9;
+      for (const Word& w : words) top = std::min(top, w.yMin);
+      double start = -1e9;
+      for (const Word& w : words) {
+        if (w.yMin < top + 0.5) start = std::max(start, w.xMax);
+        EXPECT_TRUE(Inside(w, box)) << w.text << " in label " << label;
+      }
+      EXPECT_NEAR(start, box.x + box.width - stock.padding, 0.2) << "label " << label;
+      EXPECT_NEAR(top, box.y + stock.padding, 0.2) << "label " << label;
+    }
+    for (size_t page = 0; page < sheets; ++page) {
+      ASSERT_EQ(plain[page].size(), moved[page].size());
+      for (size_t i = 0; i < plain[page].size(); ++i) {
+        EXPECT_NEAR(moved[page][i].xMin - plain[page][i].xMin, offset.x, 0.01);
+        EXPECT_NEAR(moved[page][i].yMin - plain[page][i].yMin, offset.y, 0.01);
+      }
+    }
+  }
+}
+
+// Copies and the start position work as on the HTML sheet: the page count is the sheets
+// needed, the first cells of the first sheet stay empty, copies sit side by side.
+TEST_F(PdfLabelsTest, StartAndCopiesGiveTheSheetsOfTheHtmlSheet) {
+  const LabelStock stock = *FindShippedStock("a4-2x4-105x74");  // 8 a sheet
+  panel.txtStartFrom = "5";
+  panel.txtCopies = "2";
+  const auto pages = Words(Write(BuildDb(NumberedAccounts(3)), stock, {}));
+  // 2 x (5 + 3 - 1) = 14 labels: two sheets.
+  ASSERT_EQ(pages.size(), 2u);
+  std::vector<std::string> names;
+  for (int position = 1; position <= 8; ++position) {
+    std::string text;
+    for (const Word& w : WordsIn(pages[0], StockLabelBox(stock, position))) text += w.text + " ";
+    names.push_back(text);
+  }
+  for (int position = 1; position <= 4; ++position) EXPECT_EQ(names[position - 1], "");
+  EXPECT_NE(names[4].find("1"), std::string::npos);
+  EXPECT_EQ(names[4], names[5]);
+  EXPECT_NE(names[6].find("2"), std::string::npos);
+  EXPECT_EQ(names[6], names[7]);
+  EXPECT_FALSE(WordsIn(pages[1], StockLabelBox(stock, 1)).empty());  // the third recipient
+  EXPECT_FALSE(WordsIn(pages[1], StockLabelBox(stock, 2)).empty());
+  EXPECT_TRUE(WordsIn(pages[1], StockLabelBox(stock, 3)).empty());
+}
+
+// Mixed Hebrew, Latin and digits read back in reading order. (A reader takes a page's
+// direction from the most of its letters; the label's first line keeps it Hebrew, as on
+// every real sheet.)
+TEST_F(PdfLabelsTest, TextReadsBackInReadingOrder) {
+  const std::vector<std::string> names = {"משה כהן",   "טלפון 0501234567", "כהן ABC Ltd",
+                                          "משה (כהן)", "כהן בע\"מ",        "רח' המגדל 15"};
+  std::vector<AccountRow> rows;
+  for (size_t i = 0; i < names.size(); ++i) rows.push_back(Named(std::to_string(i + 1), names[i]));
+  panel.ChkTitle = {};
+  panel.ChkTitle[0] = 1;
+  panel.ChkTitle[1] = 1;
+  for (int font = 0; font <= 2; ++font) {
+    for (int weight : {0, 2}) {
+      SCOPED_TRACE(std::to_string(font) + "/" + std::to_string(weight));
+      labels.LabelDefs[1].Font = static_cast<uint8_t>(font);
+      labels.LabelDefs[1].FontWeight = static_cast<uint8_t>(weight);
+      labels.LabelDefs[1].FontSize = 14;
+      const auto pages = PageTexts(Write(BuildDb(rows), *FindShippedStock("a4-1x1-210x297"), {}));
+      ASSERT_EQ(pages.size(), names.size());
+      for (size_t i = 0; i < names.size(); ++i) EXPECT_EQ(pages[i], "לכבוד\n" + names[i]);
+    }
+  }
+}
+
+// A line too wide shrinks; at the smallest size it ends in an ellipsis; nothing leaves the
+// label, and lines too many for the label are left out with a message.
+TEST_F(PdfLabelsTest, LongLinesShrinkThenEndInAnEllipsis) {
+  const LabelStock stock = *FindShippedStock("a4-3x11-64x24.3");
+  const std::string shrinks = "חברת השקעות ופיתוח הגליל המערבי";
+  const std::string tooLong = std::string("שם ארוך מאוד ") + std::string(80, 'x');
+  panel.ChkTitle = {};
+  panel.ChkTitle[1] = 1;
+  labels.LabelDefs[1].FontSize = 16;
+  const std::string pdf = Write(BuildDb({Named("1", shrinks), Named("2", tooLong)}), stock, {});
+  const auto pages = Words(pdf);
+  ASSERT_EQ(pages.size(), 1u);
+  for (int position = 1; position <= 2; ++position) {
+    const LabelBox box = StockLabelBox(stock, position);
+    for (const Word& w : WordsIn(pages[0], box)) EXPECT_TRUE(Inside(w, box)) << w.text;
+  }
+  const std::string text = PageTexts(pdf)[0];
+  EXPECT_NE(text.find(shrinks), std::string::npos) << text;
+  EXPECT_NE(text.find("…"), std::string::npos) << text;
+  EXPECT_EQ(text.find(tooLong), std::string::npos);
+
+  // Eight lines do not fit 11 mm even at the smallest size.
+  LabelStock narrow = stock;
+  narrow.id = "narrow";
+  narrow.labelHeight = narrow.pitchY = 15;
+  narrow.padding = 2;
+  panel.ChkTitle = {1, 1, 1, 1, 1, 1, 1, 1, 1};
+  seam.messages.clear();
+  const auto crowded = Words(Write(BuildDb(NumberedAccounts(3)), narrow, {}, "crowded.pdf"));
+  for (int position = 1; position <= 3; ++position) {
+    const LabelBox box = StockLabelBox(narrow, position);
+    for (const Word& w : WordsIn(crowded[0], box)) EXPECT_TRUE(Inside(w, box)) << w.text;
+  }
+  ASSERT_EQ(seam.messages.size(), 1u);
+  EXPECT_NE(seam.messages[0].text.find("ב-3 מדבקות"), std::string::npos);
+}
+
+// The file is replaced, never written through a link in its place; a failed run keeps the
+// old file; no labels is an error, not an empty document.
+TEST_F(PdfLabelsTest, FileIsReplacedNotWrittenThrough) {
+  const LabelStock stock = *FindShippedStock(kDefaultStockId);
+  const std::string victim = PathOf("victim.txt");
+  std::ofstream(victim) << "keep";
+  std::filesystem::create_symlink(victim, PathOf("labels.pdf"));
+  Write(BuildDb(NumberedAccounts(1)), stock, {});
+  EXPECT_FALSE(std::filesystem::is_symlink(PathOf("labels.pdf")));
+  EXPECT_EQ(ReadBytes(victim), "keep");
+  EXPECT_EQ(ReadBytes(PathOf("labels.pdf")).substr(0, 5), "%PDF-");
+
+  const std::string before = ReadBytes(PathOf("labels.pdf"));
+  EXPECT_THROW(Write(BuildDb({}), stock, {}), OutputError);
+  panel.txtCopies = "0";
+  EXPECT_THROW(Write(BuildDb(NumberedAccounts(2)), stock, {}), OutputError);
+  EXPECT_EQ(ReadBytes(PathOf("labels.pdf")), before);
+  for (const auto& entry : std::filesystem::directory_iterator(dir_)) {
+    EXPECT_EQ(entry.path().filename().string().find("labels.pdf."), std::string::npos)
+        << "temporary file left: " << entry.path();
+  }
+}
+
+TEST_F(PdfLabelsTest, CalibrationPageShowsTheStockAndItsScales) {
+  const LabelStock stock = *FindShippedStock("a4-2x7-99.1x38.1");
+  const std::string path = PathOf("calibration.pdf");
+  CreateCalibrationPdf(path, stock, {0.5, -1});
+  const auto texts = PageTexts(path);
+  ASSERT_EQ(texts.size(), 1u);
+  EXPECT_NE(texts[0].find("דף כיול לתבנית a4-2x7-99.1x38.1"), std::string::npos) << texts[0];
+  EXPECT_NE(texts[0].find("0.5"), std::string::npos) << texts[0];
+  // The offset scale across the right column's left edge: its 0 stands on that edge.
+  const LabelBox first = StockLabelBox(stock, 1, {0.5, -1});
+  bool zeroOnEdge = false;
+  const auto pages = Words(path);
+  for (const Word& w : pages[0]) {
+    if (w.text == "0" && std::fabs((w.xMin + w.xMax) / 2 - first.x) < 0.3) zeroOnEdge = true;
+  }
+  EXPECT_TRUE(zeroOnEdge);
+}
+
+}  // namespace
+}  // namespace zdr::testing
