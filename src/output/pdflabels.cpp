@@ -18,6 +18,7 @@
 #include <iterator>
 #include <memory>
 #include <optional>
+#include <unordered_map>
 #include <vector>
 
 #include "output/output.h"
@@ -235,7 +236,8 @@ void DrawRun(cairo_t* cr, const PangoGlyphItem* run, const char* text, double x,
   clusters.clear();
   runText.clear();
   // The byte where each cluster's text ends: the next cluster's start in reading order.
-  std::vector<int> starts(gs->log_clusters, gs->log_clusters + gs->num_glyphs);
+  thread_local std::vector<int> starts;
+  starts.assign(gs->log_clusters, gs->log_clusters + gs->num_glyphs);
   std::sort(starts.begin(), starts.end());
   starts.erase(std::unique(starts.begin(), starts.end()), starts.end());
   double gx = x;
@@ -414,11 +416,11 @@ class LabelPainter {
              double bh, double padding) {
     const double x0 = bx + padding, top = by + padding;
     const double width = bw - 2 * padding, height = bh - 2 * padding;
-    if (layouts_.size() < items.size()) {
-      while (layouts_.size() < items.size()) layouts_.push_back(setter_.NewLayout());
-    }
+    while (layouts_.size() < items.size()) layouts_.push_back(setter_.NewLayout());
+    if (cache_.size() >= kCachedLines) cache_.clear();
     sizes_.assign(items.size(), 0);
     heights_.assign(items.size(), 0);
+    natural_.assign(items.size(), nullptr);
     double total = 0;
     for (size_t i = 0; i < items.size(); ++i) {
       const LabelItem& item = items[i];
@@ -427,9 +429,8 @@ class LabelPainter {
         const double scale = std::min(1.0, width / p.width);
         heights_[i] = p.height * scale;
       } else {
-        PangoLayout* l = Layout(i);
         const LineStyle& s = styles_[item.style];
-        setter_.Set(l, s, s.size, item.text);
+        PangoLayout* l = natural_[i] = Natural(item, i);
         const double natural = TextSetter::Width(l);
         double size = s.size;
         // Width scales with the size: shrink a wide line to fit, not below the minimum.
@@ -445,9 +446,7 @@ class LabelPainter {
 
     bool complete = true;
     double y = top;
-    cairo_save(cr);
-    cairo_rectangle(cr, bx, by, bw, bh);
-    cairo_clip(cr);
+    cairo_set_source_rgb(cr, 0, 0, 0);
     for (size_t i = 0; i < items.size(); ++i) {
       const LabelItem& item = items[i];
       if (item.picture >= 0) {
@@ -467,27 +466,49 @@ class LabelPainter {
         y += h;
         continue;
       }
-      PangoLayout* l = Layout(i);
       const LineStyle& s = styles_[item.style];
       const double size = std::max(kMinLabelPointSize, sizes_[i] * factor);
-      if (size != s.size) setter_.Set(l, s, size, item.text);
+      PangoLayout* l = natural_[i];
+      if (size != s.size || TextSetter::Width(l) > width) {
+        if (l != Layout(i) || size != s.size) setter_.Set(Layout(i), s, size, item.text);
+        l = Layout(i);
+      }
       const double h = TextSetter::Height(l);
       if (y + h > top + height + 0.01) {
         complete = false;
         break;
       }
       if (TextSetter::Width(l) > width) Ellipsize(l, s, size, item.text, width);
-      const double w = TextSetter::Width(l);
-      cairo_set_source_rgb(cr, 0, 0, 0);
-      painter_.Draw(cr, l, x0 + width - w, y, s.underline);
+      painter_.Draw(cr, l, x0 + width - TextSetter::Width(l), y, s.underline);
       y += h;
     }
-    cairo_restore(cr);
     return complete;
   }
 
  private:
+  // Lines kept laid out at their own size: the fixed word, cities, contacts and the like
+  // repeat from label to label.
+  static constexpr size_t kCachedLines = 8192;
+
   PangoLayout* Layout(size_t i) { return static_cast<PangoLayout*>(layouts_[i].get()); }
+
+  // The item's line laid out at its style's own size: kept from the second time it is
+  // seen, laid out in the item's own layout before that.
+  PangoLayout* Natural(const LabelItem& item, size_t i) {
+    key_.assign(1, static_cast<char>('0' + item.style));
+    key_ += item.text;
+    auto it = cache_.find(key_);
+    if (it != cache_.end() && it->second) return static_cast<PangoLayout*>(it->second.get());
+    const LineStyle& s = styles_[item.style];
+    if (it == cache_.end()) {
+      cache_.emplace(key_, nullptr);  // seen once
+      setter_.Set(Layout(i), s, s.size, item.text);
+      return Layout(i);
+    }
+    it->second = setter_.NewLayout();
+    setter_.Set(static_cast<PangoLayout*>(it->second.get()), s, s.size, item.text);
+    return static_cast<PangoLayout*>(it->second.get());
+  }
 
   // The longest beginning of `text` that fits `width` with an ellipsis after it.
   void Ellipsize(PangoLayout* l, const LineStyle& s, double size, const std::string& text,
@@ -518,7 +539,10 @@ class LabelPainter {
   std::array<LineStyle, 8> styles_;
   TextSetter setter_;
   LinePainter painter_;
-  std::vector<ObjectPtr> layouts_;
+  std::vector<ObjectPtr> layouts_;  // one per item, for lines at another size
+  std::unordered_map<std::string, ObjectPtr> cache_;
+  std::string key_;
+  std::vector<PangoLayout*> natural_;
   std::vector<double> sizes_, heights_;
 };
 
