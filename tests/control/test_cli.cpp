@@ -641,4 +641,39 @@ TEST_F(CliTest, NoCommandWithoutADisplayAborted) {
   EXPECT_NE(r.err.find("DISPLAY"), std::string::npos) << r.err;
 }
 
+TEST_F(CliTest, LabelsAsPdfOnStockAndTheCalibrationPage) {
+  auto args = Base("labels");
+  const fs::path pdf = temp_ / "labels.pdf";
+  args.insert(args.end(), {"--set", "UseTitle1=1", "--pdf", pdf.string(), "--template",
+                           "a4-2x4-105x74", "--offset", "0.5,-1"});
+  RunResult r = Run(args);
+  ASSERT_EQ(r.exitCode, 0) << r.err;
+  EXPECT_EQ(r.out, pdf.string() + "\n");
+  EXPECT_EQ(ReadFile(pdf).substr(0, 5), "%PDF-");
+  EXPECT_FALSE(fs::exists(temp_ / "zdrlab1.htm"));
+
+  const fs::path page = temp_ / "calibration.pdf";
+  r = Run({"calibrate", "--settings", settings_.string(), "--pdf", page.string()});
+  ASSERT_EQ(r.exitCode, 0) << r.err;
+  EXPECT_EQ(ReadFile(page).substr(0, 5), "%PDF-");
+}
+
+TEST_F(CliTest, PdfOptionsAreChecked) {
+  const std::string pdf = (temp_ / "x.pdf").string();
+  const std::vector<std::vector<std::string>> wrong = {
+      {"calibrate"},                                          // no --pdf
+      {"labels", "--template", "a4-2x4-105x74"},              // --template without --pdf
+      {"labels", "--pdf", pdf, "--offset", "10.5,0"},         // beyond 10 mm
+      {"labels", "--pdf", pdf, "--offset", "0.05,0"},         // not a step of 0.1
+      {"labels", "--pdf", pdf, "--template", "no-such-stock"},
+      {"list", "--pdf", pdf},
+  };
+  for (const auto& args : wrong) {
+    std::vector<std::string> full = args;
+    full.insert(full.end(), {"--settings", settings_.string()});
+    EXPECT_EQ(Run(full).exitCode, 2) << args[0] << " " << (args.size() > 1 ? args[1] : "");
+  }
+  EXPECT_FALSE(fs::exists(pdf));
+}
+
 }  // namespace

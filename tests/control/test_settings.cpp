@@ -4,10 +4,14 @@
 #include <gtest/gtest.h>
 
 #include <QSettings>
+#include <cmath>
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
+#include <functional>
 #include <map>
+#include <optional>
+#include <set>
 #include <stdexcept>
 #include <string>
 #include <vector>
@@ -551,6 +555,141 @@ TEST_F(QtStoreTest, NativeStoreUsesTheApplicationName) {
   }
   QtSettingsStore again;
   EXPECT_EQ(again.Get("ZDRLab", "Params", "ConnDataBase", ""), "/srv/חברה");
+}
+
+// ---- Label stock, the PDF's settings and the user's stocks ---------------------------
+
+TEST(LabelStockTest, ShippedStocksAreSoundAndTheDefaultComesFirst) {
+  const auto& stocks = ShippedLabelStocks();
+  ASSERT_GE(stocks.size(), 8u);
+  EXPECT_EQ(stocks[0].id, kDefaultStockId);
+  std::set<std::string> ids;
+  for (const LabelStock& s : stocks) {
+    EXPECT_EQ(LabelStockProblem(s), "") << s.id;
+    EXPECT_TRUE(ids.insert(s.id).second) << s.id;
+  }
+  // Position 1 is the top row's rightmost label; the next row starts at the right again.
+  const LabelStock s = *FindShippedStock("a4-2x7-99.1x38.1");
+  EXPECT_DOUBLE_EQ(StockLabelBox(s, 1).x, 4.65 + 101.6);
+  EXPECT_DOUBLE_EQ(StockLabelBox(s, 2).x, 4.65);
+  EXPECT_DOUBLE_EQ(StockLabelBox(s, 3).y, 15.15 + 38.1);
+  EXPECT_DOUBLE_EQ(StockLabelBox(s, 3, {1, -2}).y, 15.15 + 38.1 - 2);
+}
+
+TEST(LabelStockTest, UnusableStocksAreRefused) {
+  const LabelStock good = *FindShippedStock(kDefaultStockId);
+  const std::vector<std::pair<const char*, std::function<void(LabelStock&)>>> cases = {
+      {"empty id", [](LabelStock& s) { s.id = ""; }},
+      {"id with a blank", [](LabelStock& s) { s.id = "my stock"; }},
+      {"no rows", [](LabelStock& s) { s.rows = 0; }},
+      {"label wider than its pitch", [](LabelStock& s) { s.labelWidth = 71; }},
+      {"off the page", [](LabelStock& s) { s.top = 2; }},
+      {"padding fills the label", [](LabelStock& s) { s.padding = 18.5; }},
+      {"negative margin", [](LabelStock& s) { s.side = -1; }},
+      {"not a number", [](LabelStock& s) { s.pitchY = std::nan(""); }},
+  };
+  for (const auto& [name, spoil] : cases) {
+    LabelStock s = good;
+    spoil(s);
+    EXPECT_NE(LabelStockProblem(s), "") << name;
+  }
+}
+
+TEST(LabelStockTest, OffsetsAreTenthsWithinTenMillimetres) {
+  const std::vector<std::pair<const char*, std::optional<StockOffset>>> cases = {
+      {"0,0", StockOffset{0, 0}},        {"1.5,-0.3", StockOffset{1.5, -0.3}},
+      {" 10 , -10 ", StockOffset{10, -10}}, {"+0.1,0", StockOffset{0.1, 0}},
+      {"10.1,0", std::nullopt},           {"0.05,0", std::nullopt},
+      {"1;2", std::nullopt},              {"1,", std::nullopt},
+      {"a,b", std::nullopt},              {"1,2,3", std::nullopt},
+      {"1e1,0", std::nullopt},            {"nan,0", std::nullopt}};
+  for (const auto& [text, expected] : cases) EXPECT_EQ(ParseStockOffset(text), expected) << text;
+  EXPECT_EQ(CheckedOffsetMm(0.1 + 0.2), 0.3);
+  EXPECT_EQ(FormatMm(-0.0), "0");
+  EXPECT_EQ(FormatMm(99.1), "99.1");
+  EXPECT_EQ(FormatMm(70), "70");
+}
+
+TEST(LabelPdfTest, FreshStoreGivesTheDefaultStockNoOffsetAndTheHtmlSheet) {
+  MemorySettingsStore store;
+  LabelPdfSettings pdf;
+  pdf.Template = "x";
+  pdf.Offset = {1, 1};
+  pdf.Output = 1;
+  SetGetRegLabelPdf(kActionLoad, store, pdf);
+  EXPECT_EQ(pdf.Template, kDefaultStockId);
+  EXPECT_EQ(pdf.Offset, (StockOffset{0, 0}));
+  EXPECT_EQ(pdf.Output, 0);
+}
+
+TEST(LabelPdfTest, RoundTripAndUnreadableValuesKeepTheOldOnes) {
+  MemorySettingsStore store;
+  LabelPdfSettings saved;
+  saved.Template = "a4-2x4-105x74";
+  saved.Offset = {-1.2, 0.7};
+  saved.Output = 1;
+  SetGetRegLabelPdf(kActionSave, store, saved);
+  LabelPdfSettings loaded;
+  SetGetRegLabelPdf(kActionLoad, store, loaded);
+  EXPECT_EQ(loaded.Template, saved.Template);
+  EXPECT_EQ(loaded.Offset, saved.Offset);
+  EXPECT_EQ(loaded.Output, 1);
+
+  store.Save(kSettingsApp, kLabelPdfSection, "OffsetX", "12");
+  store.Save(kSettingsApp, kLabelPdfSection, "OffsetY", "0,5");
+  store.Save(kSettingsApp, kLabelPdfSection, "Output", "2");
+  SetGetRegLabelPdf(kActionLoad, store, loaded);
+  EXPECT_EQ(loaded.Offset, saved.Offset);
+  EXPECT_EQ(loaded.Output, 1);
+}
+
+TEST(UserStockTest, SavedStockComesBackAndAnOwnOffsetWinsOverTheUsers) {
+  MemorySettingsStore store;
+  LabelStock mine = *FindShippedStock("a4-3x8-70x37");
+  mine.id = "office-2x5";
+  mine.name = "מדבקות המשרד";
+  mine.rows = 5;
+  mine.cols = 2;
+  mine.labelWidth = mine.pitchX = 100;
+  mine.labelHeight = mine.pitchY = 55.5;
+  mine.side = 5;
+  mine.top = 10;
+  SaveUserStock(store, mine);
+  SaveUserStock(store, mine);  // again: listed once
+  ASSERT_EQ(LoadUserStocks(store).size(), 1u);
+  EXPECT_EQ(LoadUserStocks(store)[0], mine);
+  EXPECT_EQ(*FindLabelStock(store, "office-2x5"), mine);
+  EXPECT_EQ(AvailableLabelStocks(store).size(), ShippedLabelStocks().size() + 1);
+
+  LabelPdfSettings pdf;
+  pdf.Offset = {0.5, 0.5};
+  EXPECT_EQ(EffectiveStockOffset(store, pdf, mine.id), pdf.Offset);
+  SaveStockOffset(store, mine.id, StockOffset{-2, 1.1});
+  EXPECT_EQ(EffectiveStockOffset(store, pdf, mine.id), (StockOffset{-2, 1.1}));
+  EXPECT_EQ(EffectiveStockOffset(store, pdf, kDefaultStockId), pdf.Offset);
+  SaveStockOffset(store, mine.id, std::nullopt);
+  EXPECT_EQ(EffectiveStockOffset(store, pdf, mine.id), pdf.Offset);
+  EXPECT_THROW(SaveStockOffset(store, mine.id, StockOffset{11, 0}), std::invalid_argument);
+
+  RemoveUserStock(store, mine.id);
+  EXPECT_TRUE(LoadUserStocks(store).empty());
+  EXPECT_FALSE(FindLabelStock(store, mine.id));
+}
+
+TEST(UserStockTest, BadOrReservedStocksAreRefusedAndSpoiledOnesLeftOut) {
+  MemorySettingsStore store;
+  LabelStock shipped = *FindShippedStock(kDefaultStockId);
+  EXPECT_THROW(SaveUserStock(store, shipped), std::invalid_argument);
+  shipped.id = "wide";
+  shipped.labelWidth = 80;
+  EXPECT_THROW(SaveUserStock(store, shipped), std::invalid_argument);
+  EXPECT_TRUE(store.SaveLog().empty());
+
+  shipped.labelWidth = 70;
+  SaveUserStock(store, shipped);
+  store.Save(kSettingsApp, "LabelStock.wide", "Rows", "many");
+  EXPECT_TRUE(LoadUserStocks(store).empty());
+  EXPECT_FALSE(FindLabelStock(store, "wide"));
 }
 
 }  // namespace
