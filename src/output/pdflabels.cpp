@@ -614,11 +614,12 @@ void Line(cairo_t* cr, double x1, double y1, double x2, double y2) {
   cairo_line_to(cr, Pt(x2), Pt(y2));
 }
 
+// A figure of a scale, centred on (xMm, yMm) or with its right end there (`align` 0.5 or 1),
+// isolated left to right so that a minus stays before its digits.
 void SmallText(cairo_t* cr, TextSetter& setter, LinePainter& painter, PangoLayout* l,
                const std::string& text, double size, double xMm, double yMm, double align) {
   LineStyle s;
-  s.family = FamilyOf(2);
-  setter.Set(l, s, size, text);
+  setter.Set(l, s, size, "\u2066" + text + "\u2069");
   const double w = TextSetter::Width(l), h = TextSetter::Height(l);
   painter.Draw(cr, l, Pt(xMm) - w * align, Pt(yMm) - h / 2, false);
 }
@@ -776,8 +777,7 @@ void CreateCalibrationPdf(const std::string& pFileName, const LabelStock& stock,
       "הדפיסו על נייר רגיל והניחו מעל גיליון מדבקות מול האור.",
       "קראו בסרגלים את מקום קצה המדבקה והוסיפו אותו להיסט (ימינה ולמטה חיובי).",
   };
-  LineStyle s;
-  s.family = FamilyOf(2);
+  const LineStyle s;
   double y = stock.pageHeight / 2 - 10;
   for (const std::string& text : lines) {
     setter.Set(l, s, 9, text);
