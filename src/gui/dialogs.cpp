@@ -26,6 +26,7 @@
 
 #include "control/control.h"
 #include "control/settings.h"
+#include "gui/labelstockbox.h"
 #include "gui/qtseam.h"
 #include "import/hostfile.h"
 #include "import/hosttext.h"
@@ -502,8 +503,10 @@ frmLabDef::frmLabDef(Control& control, FileChooser& chooser, QWidget* parent)
   auto* ok = MakeButton("cmdOK", QStringLiteral("אישור"), this);
   auto* cancel = MakeButton("cmdCancel", QStringLiteral("ביטול"), this);
   auto* all = new QVBoxLayout(this);
+  StockBox = new LabelStockBox(control_, this);
   all->addWidget(lines);
   all->addWidget(pictures);
+  all->addWidget(StockBox);
   all->addLayout(OkCancelRow(ok, cancel));
 
   connect(dir0, &QPushButton::clicked, this, [this] { CmdDir_Click(0); });
@@ -526,6 +529,7 @@ void frmLabDef::Load() {
     GetSetFormLabDefs(1);
   } catch (...) {
   }
+  StockBox->Load();
 }
 
 QWidget* frmLabDef::FirstBadValue(std::string& why) const {
@@ -591,6 +595,7 @@ bool frmLabDef::cmdOK_Click() {
     SetGetRegLabelDefs(kActionSave, control_.store(), control_.labelSettings());
   } catch (...) {
   }
+  StockBox->Save();
   accept();
   return true;
 }

@@ -37,6 +37,7 @@ class Control;
 namespace zdr::gui {
 
 class FileChooser;
+class LabelStockBox;
 
 // A check box that holds the panel's three values: 0 off, 1 on, 2 greyed. A click turns
 // it on or off; only code sets the greyed state, and a click on a greyed box turns it on.
@@ -176,6 +177,7 @@ class frmLabDef : public QDialog {
   std::array<PanelCheckBox*, kLines> ChkItalic{};
   QLineEdit* TxtHeaderLogo;
   QLineEdit* txtFooterLogo;
+  LabelStockBox* StockBox;  // labels on stock as PDF
 
  private:
   // The first control whose value cannot be taken, with the reason; null when all can.

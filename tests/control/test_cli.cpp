@@ -656,15 +656,22 @@ TEST_F(CliTest, LabelsAsPdfOnStockAndTheCalibrationPage) {
   r = Run({"calibrate", "--settings", settings_.string(), "--pdf", page.string()});
   ASSERT_EQ(r.exitCode, 0) << r.err;
   EXPECT_EQ(ReadFile(page).substr(0, 5), "%PDF-");
+
+  // Settings that ask for the PDF make the plain label command give it.
+  std::ofstream(settings_) << "[ZDRLab]\nLabelPdf\\Output=1\nLabelPdf\\Template=a4-3x8-70x37\n";
+  r = Run(Base("labels"));
+  ASSERT_EQ(r.exitCode, 0) << r.err;
+  EXPECT_EQ(r.out, (temp_ / "zdrlab1.pdf").string() + "\n");
+  EXPECT_EQ(ReadFile(temp_ / "zdrlab1.pdf").substr(0, 5), "%PDF-");
 }
 
 TEST_F(CliTest, PdfOptionsAreChecked) {
   const std::string pdf = (temp_ / "x.pdf").string();
   const std::vector<std::vector<std::string>> wrong = {
-      {"calibrate"},                                          // no --pdf
-      {"labels", "--template", "a4-2x4-105x74"},              // --template without --pdf
-      {"labels", "--pdf", pdf, "--offset", "10.5,0"},         // beyond 10 mm
-      {"labels", "--pdf", pdf, "--offset", "0.05,0"},         // not a step of 0.1
+      {"calibrate"},                                   // no --pdf
+      {"labels", "--template", "a4-2x4-105x74"},       // --template without --pdf
+      {"labels", "--pdf", pdf, "--offset", "10.5,0"},  // beyond 10 mm
+      {"labels", "--pdf", pdf, "--offset", "0.05,0"},  // not a step of 0.1
       {"labels", "--pdf", pdf, "--template", "no-such-stock"},
       {"list", "--pdf", pdf},
   };

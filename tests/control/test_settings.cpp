@@ -597,12 +597,18 @@ TEST(LabelStockTest, UnusableStocksAreRefused) {
 
 TEST(LabelStockTest, OffsetsAreTenthsWithinTenMillimetres) {
   const std::vector<std::pair<const char*, std::optional<StockOffset>>> cases = {
-      {"0,0", StockOffset{0, 0}},        {"1.5,-0.3", StockOffset{1.5, -0.3}},
-      {" 10 , -10 ", StockOffset{10, -10}}, {"+0.1,0", StockOffset{0.1, 0}},
-      {"10.1,0", std::nullopt},           {"0.05,0", std::nullopt},
-      {"1;2", std::nullopt},              {"1,", std::nullopt},
-      {"a,b", std::nullopt},              {"1,2,3", std::nullopt},
-      {"1e1,0", std::nullopt},            {"nan,0", std::nullopt}};
+      {"0,0", StockOffset{0, 0}},
+      {"1.5,-0.3", StockOffset{1.5, -0.3}},
+      {" 10 , -10 ", StockOffset{10, -10}},
+      {"+0.1,0", StockOffset{0.1, 0}},
+      {"10.1,0", std::nullopt},
+      {"0.05,0", std::nullopt},
+      {"1;2", std::nullopt},
+      {"1,", std::nullopt},
+      {"a,b", std::nullopt},
+      {"1,2,3", std::nullopt},
+      {"1e1,0", std::nullopt},
+      {"nan,0", std::nullopt}};
   for (const auto& [text, expected] : cases) EXPECT_EQ(ParseStockOffset(text), expected) << text;
   EXPECT_EQ(CheckedOffsetMm(0.1 + 0.2), 0.3);
   EXPECT_EQ(FormatMm(-0.0), "0");
