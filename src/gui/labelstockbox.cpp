@@ -108,7 +108,7 @@ void LabelStockBox::FillStocks(const std::string& choose) {
     stocks = ShippedLabelStocks();
   }
   for (const LabelStock& s : stocks) {
-    cmbStock->addItem(ToQ(s.id + "   " + s.name), ToQ(s.id));
+    cmbStock->addItem(ToQ(s.name + "   \u202A" + s.id + "\u202C"), ToQ(s.id));
   }
   const int at = cmbStock->findData(ToQ(choose));
   cmbStock->setCurrentIndex(at >= 0 ? at : 0);

@@ -38,23 +38,27 @@ bool IdChar(char c) {
 }  // namespace
 
 const std::vector<LabelStock>& ShippedLabelStocks() {
+  // Names give the label's size in millimetres, embedded left to right for the chooser.
   // Sheets without gaps between labels fill the width and leave the half millimetre the
   // height does not use at the top; the others are centred on the page as sold.
   static const std::vector<LabelStock> stocks = {
-      Stock("a4-3x8-70x37", "A4, 24 מדבקות 70×37", kA4W, kA4H, 0.5, 0, 70, 37, 70, 37, 8, 3, 3),
-      Stock("a4-3x7-70x42.3", "A4, 21 מדבקות 70×42.3", kA4W, kA4H, 0.45, 0, 70, 42.3, 70, 42.3, 7,
-            3, 3),
-      Stock("a4-2x7-99.1x38.1", "A4, 14 מדבקות 99.1×38.1", kA4W, kA4H, 15.15, 4.65, 99.1, 38.1,
-            101.6, 38.1, 7, 2, 3),
-      Stock("a4-3x11-64x24.3", "A4, 33 מדבקות 64×24.3", kA4W, kA4H, 14.85, 7, 64, 24.3, 66, 24.3,
-            11, 3, 2),
-      Stock("a4-2x8-105x37", "A4, 16 מדבקות 105×37", kA4W, kA4H, 0.5, 0, 105, 37, 105, 37, 8, 2, 4),
-      Stock("a4-2x4-105x74", "A4, 8 מדבקות 105×74", kA4W, kA4H, 0.5, 0, 105, 74, 105, 74, 4, 2, 6),
-      Stock("a4-3x10-63.5x25.4", "A4, 30 מדבקות 63.5×25.4", kA4W, kA4H, 21.5, 7.25, 63.5, 25.4, 66,
-            25.4, 10, 3, 2),
-      Stock("a4-1x1-210x297", "A4, דף שלם", kA4W, kA4H, 0, 0, 210, 297, 210, 297, 1, 1, 15),
-      Stock("letter-3x10-66.7x25.4", "Letter, 30 מדבקות 66.7×25.4", kLetterW, kLetterH, 12.7, 4.75,
-            66.7, 25.4, 69.85, 25.4, 10, 3, 2),
+      Stock("a4-3x8-70x37", "24 מדבקות \u202A70×37\u202C על A4", kA4W, kA4H, 0.5, 0, 70, 37, 70, 37,
+            8, 3, 3),
+      Stock("a4-3x7-70x42.3", "21 מדבקות \u202A70×42.3\u202C על A4", kA4W, kA4H, 0.45, 0, 70, 42.3,
+            70, 42.3, 7, 3, 3),
+      Stock("a4-2x7-99.1x38.1", "14 מדבקות \u202A99.1×38.1\u202C על A4", kA4W, kA4H, 15.15, 4.65,
+            99.1, 38.1, 101.6, 38.1, 7, 2, 3),
+      Stock("a4-3x11-64x24.3", "33 מדבקות \u202A64×24.3\u202C על A4", kA4W, kA4H, 14.85, 7, 64,
+            24.3, 66, 24.3, 11, 3, 2),
+      Stock("a4-2x8-105x37", "16 מדבקות \u202A105×37\u202C על A4", kA4W, kA4H, 0.5, 0, 105, 37, 105,
+            37, 8, 2, 4),
+      Stock("a4-2x4-105x74", "8 מדבקות \u202A105×74\u202C על A4", kA4W, kA4H, 0.5, 0, 105, 74, 105,
+            74, 4, 2, 6),
+      Stock("a4-3x10-63.5x25.4", "30 מדבקות \u202A63.5×25.4\u202C על A4", kA4W, kA4H, 21.5, 7.25,
+            63.5, 25.4, 66, 25.4, 10, 3, 2),
+      Stock("a4-1x1-210x297", "דף A4 שלם", kA4W, kA4H, 0, 0, 210, 297, 210, 297, 1, 1, 15),
+      Stock("letter-3x10-66.7x25.4", "30 מדבקות \u202A66.7×25.4\u202C על Letter", kLetterW,
+            kLetterH, 12.7, 4.75, 66.7, 25.4, 69.85, 25.4, 10, 3, 2),
   };
   return stocks;
 }
