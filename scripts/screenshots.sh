@@ -4,8 +4,8 @@
 # PNG files in DOCS_DIR, then the demo's label sheet (pages 1 and 2, as headless Chromium
 # prints it) and its address list (as Chromium shows it), and the first page of the label
 # sheet as PDF on three label stocks and a calibration page. The picker and the company
-# chooser show three generated sample
-# companies; the user's own settings are neither read nor changed.
+# chooser show three generated sample companies; the user's own settings are neither read
+# nor changed.
 set -euo pipefail
 build="$1"; docs="$2"
 mkdir -p "$docs"
