@@ -6,6 +6,7 @@
 #include "control/settings.h"
 #include "output/output.h"
 #include "output/pdflabels.h"
+#include "workdb/worklock.h"
 
 namespace zdr {
 namespace {
@@ -35,6 +36,8 @@ std::string Control::CmdLabPdf(const std::string& path, const std::string& stock
                                std::optional<StockOffset> offset) {
   try {
     const StockChoice choice = ChooseStock(store_, labelPdf_, stockId, offset);
+    // The data load rebuilds the temporary folder's working database: no other run may.
+    const auto lock = LockWorkFiles();
     ReadAllData(true);
     ui_.YieldToEvents();
     ui_.SetStatus("מכין רשימה");
