@@ -32,6 +32,7 @@ mv "$work"/sheet-*2.png "$docs/sheet-page2.png"
 "${chromium[@]}" --hide-scrollbars --window-size=1000,900 --screenshot="$docs/list.png" \
   "file://$work/demo-out/zdrlab2.htm" >/dev/null 2>&1
 
+: > "$work/pdf.ini"  # an empty store: the defaults
 lines=()
 for i in 0 1 2 3 4 5 6 7 8; do lines+=(--set "UseTitle$i=1"); done
 for stock in a4-3x8-70x37 a4-2x7-99.1x38.1 a4-2x4-105x74; do
