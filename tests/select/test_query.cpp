@@ -1,266 +1,212 @@
-// The column list, the ORDER BY clause and the statement as the outputs assemble it.
+// The recipients statement as text: the WHERE clause, the column list, the ORDER BY clause
+// and how the outputs assemble them. What the statement selects is in test_selection_rows.
 
 #include <gtest/gtest.h>
 
+#include <functional>
 #include <stdexcept>
 #include <string>
 
 #include "import/doctypes.h"
 #include "select/select.h"
+#include "support/statements.h"
 #include "workdb/jetsql.h"
 
 namespace zdr {
 namespace {
 
-constexpr const char* kAccountColumns =
-    "SELECT Distinct tAccount.CategoryCode, tAccount.AccountKey, tAccount.AccountName, "
-    "tAccount.Address, tAccount.City, tAccount.Zip, 1000 As Reference1, '0' As DetailsLine1, "
-    "tAccount.District, tAccount.Details, tAccount.Telephone, tAccount.SortByKey, "
-    "tAccount.SortByKeyVal, tAccount.SortByName, tAccount.SortByCity, tAccount.SortByZip";
-constexpr const char* kDocumentColumns =
-    "SELECT Distinct tAccount.CategoryCode, tAccount.AccountKey, tStockHead.CustomerName As "
-    "AccountName, tStockHead.Address1 As Address, tStockHead.Address2 As City, '' As Zip, "
-    "tStockHead.Reference1, tStockHead.DetailsLine1, tAccount.District, tAccount.Details, "
-    "tAccount.Telephone, tAccount.SortByKey, tAccount.SortByKeyVal, tStockHead.SortByName, "
-    "tStockHead.SortByCity, tStockHead.SortByZip";
+using namespace test;  // the statement pieces
 
-class QueryTest : public ::testing::Test {
- protected:
-  std::string Select(bool& useDocs) { return BuildSelect(panel_, docTypes_, 0, useDocs); }
-  std::string OrderBy(bool useDocs) { return BuildOrderBy(panel_, docTypes_, useDocs); }
-  Panel panel_;
-  DocTypeTable docTypes_;
+const std::string kSelectDb = "/tmp/zdracc.DB";
+
+struct CriteriaCase {
+  const char* name;
+  std::function<void(Panel&)> set;
+  bool useDocs, notIssued, pickerOpened;
+  std::string expected;  // after " Where (1 > 0)"; "Error" for the whole clause
 };
 
-TEST_F(QueryTest, WithoutDocumentsTheAccountVariantFromAccountsAlone) {
-  for (int addressFrom : {0, 1, -1}) {
-    panel_.cmbAddressFrom = addressFrom;
-    bool useDocs = false;
-    EXPECT_EQ(Select(useDocs), std::string(kAccountColumns) + " FROM tAccount");
-    EXPECT_FALSE(useDocs);
-  }
-}
-
-TEST_F(QueryTest, DocumentsWithAddressFromHeaderGiveTheDocumentVariant) {
-  panel_.cmbDocType = 13;
-  panel_.cmbAddressFrom = 0;
-  bool useDocs = true;
-  EXPECT_EQ(Select(useDocs), std::string(kDocumentColumns) + " FROM tAccount, tStockHead");
-  EXPECT_TRUE(useDocs);
-}
-
-TEST_F(QueryTest, DocumentsWithAddressFromAccountStillJoinHeaders) {
-  panel_.cmbDocType = 0;
-  for (int addressFrom : {1, -1, 5}) {
-    panel_.cmbAddressFrom = addressFrom;
-    bool useDocs = true;
-    EXPECT_EQ(Select(useDocs), std::string(kAccountColumns) + " FROM tAccount, tStockHead");
-  }
-}
-
-TEST_F(QueryTest, CashReceiptsResetUseDocsForTheCaller) {
-  panel_.cmbDocType = kCashReceiptsRow;
-  bool useDocs = true;
-  EXPECT_EQ(Select(useDocs), std::string(kAccountColumns) + " FROM tAccount");
-  EXPECT_FALSE(useDocs);
-
-  useDocs = true;
-  EXPECT_EQ(BuildOrderBy(panel_, docTypes_, useDocs), " ORDER BY tAccount.SortByKey ASC");
-  EXPECT_FALSE(useDocs);
-}
-
-TEST_F(QueryTest, SelectIgnoresTheIndexArgument) {
-  panel_.cmbDocType = 0;
-  bool useDocs = true;
-  EXPECT_EQ(BuildSelect(panel_, docTypes_, kCashReceiptsRow, useDocs),
-            std::string(kDocumentColumns) + " FROM tAccount, tStockHead");
-  EXPECT_TRUE(useDocs);
-}
-
-TEST_F(QueryTest, DocumentTypeOutsideTheTableThrows) {
-  for (int row : {-1, 42}) {
-    panel_.cmbDocType = row;
-    for (bool initial : {true, false}) {
-      bool useDocs = initial;
-      EXPECT_THROW(Select(useDocs), std::out_of_range) << row;
-      useDocs = initial;
-      EXPECT_THROW(BuildOrderBy(panel_, docTypes_, useDocs), std::out_of_range) << row;
-    }
-    EXPECT_THROW(BuildRecipientsStatement(panel_, docTypes_, ""), std::out_of_range);
-  }
-}
-
-struct SortCase {
-  int sortBy;
-  const char* accountOrder;   // direction "ASC"
-  const char* documentOrder;  // documents used, address from the header
-};
-
-class SortByTest : public QueryTest, public ::testing::WithParamInterface<SortCase> {};
-
-TEST_P(SortByTest, FirstColumnDirectionAndSecondColumn) {
-  const SortCase& c = GetParam();
-  panel_.CmbSortBy = c.sortBy;
-  panel_.CmbSortDir = 0;
-  panel_.cmbDocType = 0;
-  panel_.cmbAddressFrom = 0;
-  EXPECT_EQ(OrderBy(false), c.accountOrder);
-  EXPECT_EQ(OrderBy(true), c.documentOrder);
-  // Documents with the address from the account card order like the account variant.
-  panel_.cmbAddressFrom = 1;
-  EXPECT_EQ(OrderBy(true), c.accountOrder);
-}
-
-INSTANTIATE_TEST_SUITE_P(
-    EverySortEntry, SortByTest,
-    ::testing::Values(
-        SortCase{0, " ORDER BY tAccount.SortByKey ASC", " ORDER BY tAccount.SortByKey ASC"},
-        SortCase{1, " ORDER BY tAccount.SortByName ASC", " ORDER BY tStockHead.SortByName ASC"},
-        SortCase{2, " ORDER BY tAccount.SortByCity ASC, tAccount.SortByName",
-                 " ORDER BY tStockHead.SortByCity ASC, tStockHead.SortByName"},
-        SortCase{3, " ORDER BY tAccount.SortByZip ASC, tAccount.SortByName",
-                 " ORDER BY tStockHead.SortByZip ASC, tStockHead.SortByName"},
-        SortCase{4, " ORDER BY tAccount.Telephone ASC, tAccount.SortByName",
-                 " ORDER BY tAccount.Telephone ASC,tStockHead.SortByName"},
-        SortCase{5, " ORDER BY tAccount.CategoryCode ASC, tAccount.SortByName",
-                 " ORDER BY tAccount.CategoryCode ASC,tStockHead.SortByName"},
-        SortCase{6, " ORDER BY tAccount.SortByKeyVal ASC", " ORDER BY tAccount.SortByKeyVal ASC"},
-        SortCase{7, " ORDER BY tAccount.CategoryCode ASC, tAccount.SortByName",
-                 " ORDER BY tStockHead.Reference1 ASC,tStockHead.SortByName"},
-        SortCase{8, " ORDER BY tAccount.SortByName ASC", " ORDER BY tStockHead.SortByName ASC"},
-        SortCase{-1, " ORDER BY tAccount.SortByName ASC", " ORDER BY tStockHead.SortByName ASC"}));
-
-TEST_F(QueryTest, DirectionAppliesToTheFirstColumnOnly) {
-  panel_.CmbSortBy = 2;
-  panel_.CmbSortDir = 1;
-  EXPECT_EQ(OrderBy(false), " ORDER BY tAccount.SortByCity DESC, tAccount.SortByName");
-  panel_.CmbSortBy = 0;
-  panel_.CmbSortDir = 0;
-  EXPECT_EQ(OrderBy(false), " ORDER BY tAccount.SortByKey ASC");
-}
-
-TEST_F(QueryTest, NoDirectionLeavesTheTrailingBlank) {
-  panel_.CmbSortBy = 0;
-  for (int dir : {-1, 2}) {
-    panel_.CmbSortDir = dir;
-    EXPECT_EQ(OrderBy(false), " ORDER BY tAccount.SortByKey ");
-  }
-  panel_.CmbSortBy = 4;
-  panel_.CmbSortDir = -1;
-  EXPECT_EQ(OrderBy(true), " ORDER BY tAccount.Telephone ,tStockHead.SortByName");
-}
-
-TEST_F(QueryTest, SortByDocumentNumberWithoutDocumentsUsesSortCode) {
-  panel_.CmbSortBy = 7;
-  panel_.CmbSortDir = 1;
-  EXPECT_EQ(OrderBy(false), " ORDER BY tAccount.CategoryCode DESC, tAccount.SortByName");
-}
-
-// The whole statement: pUseDocs is computed afresh for each piece, so the cash-receipt
-// reset in the column list does not take the tCash test out of the WHERE clause.
-class StatementTest : public QueryTest {
- protected:
-  std::string Pieces(bool useDocs, bool notIssued) {
-    bool forSelect = useDocs;
-    std::string sql =
-        BuildSelect(panel_, docTypes_, static_cast<int16_t>(panel_.cmbDocType), forSelect);
-    sql += BuildCriteria(panel_, docTypes_, selectDb_, useDocs, notIssued);
-    bool forOrder = useDocs;
-    return sql + BuildOrderBy(panel_, docTypes_, forOrder);
-  }
-  std::string selectDb_;
-};
-
-TEST_F(StatementTest, NoDocumentsIsSelectCriteriaOrderBy) {
-  panel_.ChkCity = 1;
-  panel_.TxtCity = "חי";
-  panel_.CmbSortBy = 2;
-  panel_.CmbSortDir = 1;
-  const std::string sql = BuildRecipientsStatement(panel_, docTypes_, selectDb_);
-  EXPECT_EQ(sql, Pieces(false, false));
-  EXPECT_EQ(sql, std::string(kAccountColumns) +
-                     " FROM tAccount Where (1 > 0) AND tAccount.City LIKE \"חי*\""
-                     " ORDER BY tAccount.SortByCity DESC, tAccount.SortByName");
-}
-
-TEST_F(StatementTest, IssuedStockDocumentsFromTheHeader) {
-  panel_.ChkDates = 1;
-  panel_.cmbByDoc = 0;
-  panel_.cmbDocType = 13;
-  panel_.CmbSortBy = 4;
-  const std::string sql = BuildRecipientsStatement(panel_, docTypes_, selectDb_);
-  EXPECT_EQ(sql, Pieces(true, false));
-  EXPECT_EQ(sql, std::string(kDocumentColumns) +
-                     " FROM tAccount, tStockHead Where (1 > 0) AND tStockHead.Include AND "
-                     "tAccount.AccountKey = tStockHead.AccountKey ORDER BY tAccount.Telephone "
-                     "ASC,tStockHead.SortByName");
-}
-
-TEST_F(StatementTest, IssuedCashReceiptsKeepTheCashTest) {
-  panel_.ChkDates = 1;
-  panel_.cmbByDoc = 0;
-  panel_.cmbDocType = kCashReceiptsRow;
-  const std::string sql = BuildRecipientsStatement(panel_, docTypes_, selectDb_);
-  EXPECT_EQ(sql, Pieces(true, false));
-  EXPECT_EQ(sql, std::string(kAccountColumns) +
-                     " FROM tAccount Where (1 > 0) AND tAccount.AccountKey In (Select Distinct "
-                     "AccountKey From tCash) ORDER BY tAccount.SortByKey ASC");
-}
-
-TEST_F(StatementTest, NotIssuedAndHandPicked) {
-  panel_.ChkDates = 1;
-  panel_.cmbByDoc = 1;
-  panel_.ChkSelectAccount = 1;
-  selectDb_ = "/tmp/zdracc.DB";
-  const std::string sql = BuildRecipientsStatement(panel_, docTypes_, selectDb_);
-  EXPECT_EQ(sql, Pieces(false, true));
-  EXPECT_NE(sql.find(" FROM tAccount Where"), std::string::npos);
-  EXPECT_NE(sql.find("Not In (Select Distinct AccountKey From tStockHead"), std::string::npos);
-  EXPECT_NE(sql.find("SortByKey In (Select SA.SortByKey"), std::string::npos);
-}
-
-TEST_F(StatementTest, DocumentsOffIgnoresByDocAndDocType) {
-  panel_.ChkDates = 2;  // greyed counts as off
-  panel_.cmbByDoc = 1;
-  panel_.cmbDocType = 5;
-  EXPECT_EQ(BuildRecipientsStatement(panel_, docTypes_, selectDb_),
-            std::string(kAccountColumns) +
-                " FROM tAccount Where (1 > 0) ORDER BY "
-                "tAccount.SortByKey ASC");
-}
-
-}  // namespace
-}  // namespace zdr
-
-namespace zdr {
-namespace {
-
-TEST(StatementTranslationTest, EveryVariantIsAcceptedByTheTranslator) {
+TEST(CriteriaTest, EachCriterionInItsFixedPlace) {
+  const std::string cityPhone =
+      " AND tAccount.City LIKE \"חי*\" AND tAccount.Telephone LIKE \"04*\"";
+  const CriteriaCase cases[] = {
+      {"none", [](Panel&) {}, false, false, true, ""},
+      {"prefixes as typed",
+       [](Panel& p) { p.ChkCity = p.ChkPhone = 1, p.TxtCity = "חי", p.txtPhone = "04"; }, false,
+       false, false, cityPhone},
+      {"greyed boxes", [](Panel& p) { p.ChkCity = p.ChkSelectAccount = 2, p.TxtCity = "חי"; },
+       false, false, true, ""},
+      {"picker never opened", [](Panel& p) { p.ChkSelectAccount = 1; }, false, false, false, ""},
+      {"picked", [](Panel& p) { p.ChkSelectAccount = 1, p.cmbInAccounts = 2; }, false, false, true,
+       kPicked},
+      {"not picked", [](Panel& p) { p.ChkSelectAccount = 1, p.cmbInAccounts = 1; }, false, false,
+       true, kNotPicked},
+      {"issued stock", [](Panel& p) { p.cmbDocType = 27; }, true, false, false, kStockJoin},
+      {"issued receipts", [](Panel& p) { p.cmbDocType = kCashReceiptsRow; }, true, false, false,
+       kCashIn},
+      {"empty row", [](Panel& p) { p.cmbDocType = 41; }, true, false, false, kCashIn},
+      {"not issued receipts", [](Panel& p) { p.cmbDocType = kCashReceiptsRow; }, false, true, false,
+       kNotIssued},
+      {"row not looked up", [](Panel& p) { p.cmbDocType = 42; }, false, true, false, kNotIssued},
+      {"row out of range", [](Panel& p) { p.cmbDocType = -1; }, true, false, false, "Error"},
+      {"ledger", [](Panel& p) { p.chkTransType = 1, p.txtTransType = "12"; }, false, false, false,
+       kLedger},
+      {"all",
+       [](Panel& p) {
+         p.ChkCity = p.ChkPhone = p.ChkSelectAccount = p.cmbInAccounts = p.ChkJournal = 1;
+         p.TxtCity = "חי", p.txtPhone = "04", p.txtFromJournal = "5";
+       },
+       true, true, true, cityPhone + kNotPicked + kStockJoin + kNotIssued + kLedger},
+  };
   const DocTypeTable docTypes;
-  for (int docType : {0, 13, kCashReceiptsRow, 27}) {
-    for (int byDoc : {0, 1, -1}) {
-      for (int addressFrom : {0, 1}) {
-        for (int sortBy = -1; sortBy <= 8; ++sortBy) {
-          for (int sortDir : {-1, 0, 1}) {
-            Panel panel;
-            panel.ChkDates = 1;
-            panel.cmbDocType = docType;
-            panel.cmbByDoc = byDoc;
-            panel.cmbAddressFrom = addressFrom;
-            panel.CmbSortBy = sortBy;
-            panel.CmbSortDir = sortDir;
-            panel.ChkCity = 1;
-            panel.TxtCity = "חי\"פה";
-            panel.ChkSelectAccount = 1;
-            panel.ChkJournal = 1;
-            panel.txtFromJournal = "1";
-            const std::string sql = BuildRecipientsStatement(panel, docTypes, "zdracc.DB");
-            EXPECT_NO_THROW(db::TranslateJetSql(sql)) << sql;
-          }
-        }
-      }
+  for (const CriteriaCase& c : cases) {
+    Panel panel;
+    c.set(panel);
+    const std::string where =
+        BuildCriteria(panel, docTypes, c.pickerOpened ? kSelectDb : "", c.useDocs, c.notIssued);
+    EXPECT_EQ(where, c.expected == "Error" ? c.expected : kWhere + c.expected) << c.name;
+  }
+}
+
+// A typed double quote ended the LIKE literal early, letting the rest of the box into the
+// statement. It is doubled now, and the database sees the typed text as one literal.
+TEST(CriteriaTest, DoubleQuoteInCityOrPhoneEndedLiteralEarly) {
+  Panel panel;
+  panel.ChkCity = panel.ChkPhone = 1;
+  panel.TxtCity = "x\" OR 1=1 OR \"";
+  panel.txtPhone = "\"04";
+  const std::string where = BuildCriteria(panel, DocTypeTable(), "", false, false);
+  EXPECT_EQ(where, std::string(kWhere) + " AND tAccount.City LIKE \"x\"\" OR 1=1 OR \"\"*\"" +
+                       " AND tAccount.Telephone LIKE \"\"\"04*\"");
+  const std::string sql = db::TranslateJetSql("SELECT AccountKey FROM tAccount" + where);
+  EXPECT_NE(sql.find("LIKE 'x\" OR 1=1 OR \"*'"), std::string::npos) << sql;
+}
+
+TEST(CriteriaTest, EachLedgerBoxNeedsItsTextAndATick) {
+  using Text = std::string Panel::*;
+  const std::pair<int Panel::*, Text> pairs[] = {
+      {&Panel::ChkJournal, &Panel::txtFromJournal},
+      {&Panel::ChkJournal, &Panel::txtToJournal},
+      {&Panel::chkTransType, &Panel::txtTransType},
+      {&Panel::chkTransDates, &Panel::txtFromTransDate},
+      {&Panel::chkTransDates, &Panel::txtToTransDate},
+      {&Panel::chkTransVDate, &Panel::txtFromTransVDate},
+      {&Panel::chkTransVDate, &Panel::txtToTransVDate},
+  };
+  EXPECT_FALSE(UseTransactions(Panel()));  // designed dates, no box ticked
+  for (const auto& [check, text] : pairs) {
+    Panel panel;
+    for (Text t : {&Panel::txtFromTransDate, &Panel::txtToTransDate, &Panel::txtFromTransVDate,
+                   &Panel::txtToTransVDate}) {
+      (panel.*t).clear();
+    }
+    panel.*check = 1;
+    EXPECT_FALSE(UseTransactions(panel)) << "ticked box, empty text";
+    panel.*text = "1";
+    EXPECT_TRUE(UseTransactions(panel));
+    panel.*check = 2;
+    EXPECT_FALSE(UseTransactions(panel)) << "greyed box";
+  }
+  EXPECT_EQ(BuildDatesCriteria(Date(), Date(), -1), " AND (1 > 0)");
+  EXPECT_EQ(BuildDatesCriteria(Date(), Date(), 0), "");
+}
+
+TEST(SelectTest, ColumnsFromTheHeaderOnlyForIssuedStockDocumentsAddressedFromIt) {
+  const DocTypeTable docTypes;
+  struct Case {
+    int docType, addressFrom;
+    bool useDocs;
+    std::string expected;
+    bool useDocsAfter;
+  };
+  const std::string accounts = std::string(kAccountColumns) + " FROM tAccount";
+  const Case cases[] = {
+      {0, 0, false, accounts, false},
+      {13, 0, true, std::string(kDocumentColumns) + " FROM tAccount, tStockHead", true},
+      {0, 1, true, accounts + ", tStockHead", true},  // the join, for the WHERE clause
+      {kCashReceiptsRow, 0, true, accounts, false},   // no header to address from
+  };
+  for (const Case& c : cases) {
+    Panel panel;
+    panel.cmbDocType = c.docType;
+    panel.cmbAddressFrom = c.addressFrom;
+    bool useDocs = c.useDocs;
+    EXPECT_EQ(BuildSelect(panel, docTypes, kCashReceiptsRow, useDocs), c.expected) << c.docType;
+    EXPECT_EQ(useDocs, c.useDocsAfter) << c.docType;
+    useDocs = c.useDocs;
+    BuildOrderBy(panel, docTypes, useDocs);
+    EXPECT_EQ(useDocs, c.useDocsAfter) << c.docType;
+    panel.ChkDates = c.useDocs ? 1 : 0;
+    EXPECT_EQ(AddressFromDocumentHeader(panel, docTypes), c.useDocsAfter && c.addressFrom == 0);
+  }
+  for (int row : {-1, 42}) {
+    Panel panel;
+    panel.cmbDocType = row;
+    bool useDocs = false;
+    EXPECT_THROW(BuildSelect(panel, docTypes, 0, useDocs), std::out_of_range);
+    EXPECT_THROW(BuildOrderBy(panel, docTypes, useDocs), std::out_of_range);
+    EXPECT_THROW(BuildRecipientsStatement(panel, docTypes, ""), std::out_of_range);
+  }
+}
+
+// The first column with its direction, then the second column, which always ascends.
+TEST(OrderByTest, EverySortEntryOnBothVariants) {
+  struct Case {
+    int sortBy, sortDir;
+    const char* accountOrder;
+    const char* documentOrder;  // documents used, address from the header
+  };
+  const Case cases[] = {
+      {0, 0, "tAccount.SortByKey ASC", "tAccount.SortByKey ASC"},
+      {1, 1, "tAccount.SortByName DESC", "tStockHead.SortByName DESC"},
+      {2, 1, "tAccount.SortByCity DESC, tAccount.SortByName",
+       "tStockHead.SortByCity DESC, tStockHead.SortByName"},
+      {3, 0, "tAccount.SortByZip ASC, tAccount.SortByName",
+       "tStockHead.SortByZip ASC, tStockHead.SortByName"},
+      {4, -1, "tAccount.Telephone , tAccount.SortByName",
+       "tAccount.Telephone ,tStockHead.SortByName"},
+      {5, 0, "tAccount.CategoryCode ASC, tAccount.SortByName",
+       "tAccount.CategoryCode ASC,tStockHead.SortByName"},
+      {6, 2, "tAccount.SortByKeyVal ", "tAccount.SortByKeyVal "},
+      {7, 1, "tAccount.CategoryCode DESC, tAccount.SortByName",
+       "tStockHead.Reference1 DESC,tStockHead.SortByName"},
+      {8, 0, "tAccount.SortByName ASC", "tStockHead.SortByName ASC"},
+      {-1, 0, "tAccount.SortByName ASC", "tStockHead.SortByName ASC"},
+  };
+  const DocTypeTable docTypes;
+  for (const Case& c : cases) {
+    Panel panel;
+    panel.CmbSortBy = c.sortBy;
+    panel.CmbSortDir = c.sortDir;
+    for (auto [addressFrom, useDocs] : {std::pair{0, false}, {0, true}, {1, true}}) {
+      panel.cmbAddressFrom = addressFrom;
+      const bool docCase = useDocs && addressFrom == 0;
+      EXPECT_EQ(BuildOrderBy(panel, docTypes, useDocs),
+                std::string(" ORDER BY ") + (docCase ? c.documentOrder : c.accountOrder))
+          << c.sortBy;
     }
   }
+}
+
+// Each piece gets pUseDocs afresh, so the cash-receipt reset in the column list does not take
+// the tCash test out of the WHERE clause.
+TEST(StatementTest, PiecesInOrderWithUseDocsComputedForEach) {
+  Panel panel;
+  panel.ChkDates = 1;
+  panel.cmbDocType = kCashReceiptsRow;
+  const DocTypeTable docTypes;
+  EXPECT_EQ(BuildRecipientsStatement(panel, docTypes, ""), std::string(kAccountColumns) +
+                                                               " FROM tAccount" + kWhere + kCashIn +
+                                                               " ORDER BY tAccount.SortByKey ASC");
+  panel.cmbByDoc = 1;
+  panel.cmbDocType = 13;
+  EXPECT_EQ(BuildRecipientsStatement(panel, docTypes, ""),
+            std::string(kAccountColumns) + " FROM tAccount" + kWhere + kNotIssued +
+                " ORDER BY tAccount.SortByKey ASC");
+  panel.ChkDates = 2;  // greyed: documents off, by-document choice ignored
+  EXPECT_EQ(BuildRecipientsStatement(panel, docTypes, ""), std::string(kAccountColumns) +
+                                                               " FROM tAccount" + kWhere +
+                                                               " ORDER BY tAccount.SortByKey ASC");
 }
 
 }  // namespace
