@@ -124,7 +124,8 @@ TEST(SelectTest, ColumnsFromTheHeaderOnlyForIssuedStockDocumentsAddressedFromIt)
       {0, 0, false, accounts, false},
       {13, 0, true, std::string(kDocumentColumns) + " FROM tAccount, tStockHead", true},
       {0, 1, true, accounts + ", tStockHead", true},  // the join, for the WHERE clause
-      {kCashReceiptsRow, 0, true, accounts, false},   // no header to address from
+      {0, -1, true, accounts + ", tStockHead", true},
+      {kCashReceiptsRow, 0, true, accounts, false},  // no header to address from
   };
   for (const Case& c : cases) {
     Panel panel;

@@ -231,26 +231,6 @@ TEST_F(GeneratedRows, IssuedAndNotIssuedSplitTheAccounts) {
   EXPECT_EQ(notIssued.size() + rows.size(), All().size());
 }
 
-TEST_F(GeneratedRows, IssuedDocumentsFromTheHeaderGiveOneRowPerDocument) {
-  ChooseInvoices(0, 0);
-  const auto documents = IssuedInvoices();
-  std::vector<Row> rows = Select();
-  ASSERT_EQ(rows.size(), documents.size());
-  for (const Row& r : rows) {
-    auto d = std::find_if(documents.begin(), documents.end(), [&](const auto* x) {
-      return std::to_string(x->reference) == Text(r, "Reference1");
-    });
-    ASSERT_NE(d, documents.end()) << Text(r, "Reference1");
-    EXPECT_EQ(Text(r, "AccountKey"), *Expected({(*d)->accountIndex}).begin());
-    EXPECT_EQ(Text(r, "Zip"), "");
-    // The header's second line is the account's city and a number.
-    const std::string& city = truth_.accounts[(*d)->accountIndex].city;
-    if (!city.empty() && static_cast<unsigned char>(city[0]) >= 0x80) {
-      EXPECT_TRUE(Text(r, "City").starts_with(city + " ")) << Text(r, "City");
-    }
-  }
-}
-
 TEST_F(GeneratedRows, CashReceiptsInTheDateRangeAndLedgerOfAJournalRange) {
   panel_.ChkDates = 1;
   panel_.cmbDocType = kCashReceiptsRow;
