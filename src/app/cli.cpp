@@ -1,6 +1,11 @@
 #include "app/cli.h"
 
+#ifndef _WIN32
+#include <sys/resource.h>
+#endif
+
 #include <charconv>
+#include <chrono>
 #include <cstdio>
 #include <filesystem>
 #include <fstream>
@@ -22,7 +27,7 @@ namespace {
 
 const char* const kUsage =
     "usage: zdrlab labels|list|post [--company DIR] [--settings FILE] [--set NAME=VALUE]... "
-    "[--open]\n"
+    "[--open] [--times]\n"
     "       zdrlab post [--check] [--strict] ...\n"
     "       zdrlab labels --pdf FILE [--template ID] [--offset X,Y] [options as above]\n"
     "       zdrlab calibrate --pdf FILE [--template ID] [--offset X,Y] [--settings FILE]\n"
@@ -38,7 +43,59 @@ const char* const kUsage =
     "Files are written in the folder named by Temp (else the system's temporary folder).\n"
     "NAME is a key of section Params or PostIL of the settings, or one of txtFromRef, "
     "txtToRef, ChkByItems, txtFromItmKey, txtToItmKey, txtFromItmSort, txtToItmSort, "
-    "txtStartFrom.\n";
+    "txtStartFrom.\n"
+    "--times prints, at the end, the wall and processor seconds at which each status line was "
+    "reached.\n";
+
+// Wall and processor seconds since the command started, taken at every status line, for the
+// whole-process benchmark: it splits a command into the data load and the output this way.
+class StepClock {
+ public:
+  StepClock() : start_(std::chrono::steady_clock::now()) {}
+  void Mark(std::string_view step) { steps_.push_back({std::string(step), Wall(), Processor()}); }
+  void Print(std::FILE* out) {
+    Mark("end");
+    for (const Step& s : steps_) {
+      std::fprintf(out, "times\t%.3f\t%.3f\t%s\n", s.wall, s.processor, s.name.c_str());
+    }
+  }
+
+ private:
+  struct Step {
+    std::string name;
+    double wall, processor;
+  };
+  double Wall() const {
+    return std::chrono::duration<double>(std::chrono::steady_clock::now() - start_).count();
+  }
+  // Every thread of the process, user and system time.
+  static double Processor() {
+#ifdef _WIN32
+    return 0;
+#else
+    rusage r{};
+    getrusage(RUSAGE_SELF, &r);
+    auto seconds = [](const timeval& t) { return t.tv_sec + t.tv_usec / 1e6; };
+    return seconds(r.ru_utime) + seconds(r.ru_stime);
+#endif
+  }
+  std::chrono::steady_clock::time_point start_;
+  std::vector<Step> steps_;
+};
+
+// The console seam, also marking the clock at every status line.
+class TimedConsoleSeam : public ConsoleSeam {
+ public:
+  TimedConsoleSeam(std::FILE* err, bool openFiles, StepClock* clock)
+      : ConsoleSeam(err, openFiles), clock_(clock) {}
+  void SetStatus(std::string_view text) override {
+    if (clock_ != nullptr) clock_->Mark(text);
+    ConsoleSeam::SetStatus(text);
+  }
+
+ private:
+  StepClock* clock_;
+};
 
 // Settings whose control takes only some whole numbers: a value the control could not hold
 // is refused here, before anything runs, instead of being dropped or reaching the output.
@@ -152,7 +209,7 @@ int RunCli(const std::vector<std::string>& args, SettingsStore& defaultStore) {
   const std::string command = args[0];
   std::optional<std::string> company, settingsFile;
   std::vector<std::pair<std::string, std::string>> sets;
-  bool open = false, check = false, strict = false;
+  bool open = false, check = false, strict = false, times = false;
   std::optional<std::string> pdf, stockId;
   std::optional<StockOffset> offset;
   for (size_t i = 1; i < args.size(); ++i) {
@@ -196,6 +253,8 @@ int RunCli(const std::vector<std::string>& args, SettingsStore& defaultStore) {
         if (!offset)
           throw std::invalid_argument(
               "--offset takes X,Y in mm, each -10 to 10 in steps of 0.1, not " + xy);
+      } else if (a == "--times" && !inlineValue) {
+        times = true;
       } else {
         throw std::invalid_argument("unknown option " + a);
       }
@@ -225,7 +284,8 @@ int RunCli(const std::vector<std::string>& args, SettingsStore& defaultStore) {
   if (settingsFile) fileStore = std::make_unique<QtSettingsStore>(*settingsFile);
   SettingsStore& store = fileStore ? *fileStore : defaultStore;
 
-  ConsoleSeam ui(stderr, open);
+  StepClock clock;
+  TimedConsoleSeam ui(stderr, open, times ? &clock : nullptr);
   Control control(store, ui);
   control.Initialize();
   if (company) control.state().companyPath = *company;
@@ -268,6 +328,7 @@ int RunCli(const std::vector<std::string>& args, SettingsStore& defaultStore) {
       return 3;
     }
   }
+  if (times) clock.Print(stderr);
   if (produced.empty() || ui.failures() > 0) return 1;
   std::cout << produced << std::endl;
   return 0;
