@@ -4,7 +4,7 @@ JOBS ?= $(shell nproc)
 OUT ?= $(CURDIR)/out
 SAMPLE ?= $(CURDIR)/sample
 
-.PHONY: deps build build-release build-strict demo test test-asan bench run screenshots clean format format-check
+.PHONY: deps build build-release build-strict demo test test-asan bench bench-e2e run screenshots clean format format-check
 
 deps:
 	@bash scripts/install-deps.sh
@@ -32,6 +32,11 @@ test-asan: deps
 
 bench: build-release
 	@bash scripts/bench.sh build/release
+
+# The whole process on the large generated company: wall, processor time and peak memory of
+# labels, list and post, against the data load's single-thread floor; checks the outputs.
+bench-e2e: build-release
+	@bash scripts/bench-e2e.sh build/release
 
 run: build
 	@bash scripts/demo.sh build/default "$(SAMPLE)" "" >/dev/null
