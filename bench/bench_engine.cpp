@@ -36,8 +36,8 @@ constexpr int kRows = 1'000'000;
 constexpr const char* kLocale = ";LANGID=0x040D;CP=1255;COUNTRY=0";
 // The scratch pragmas of the layer (engine.cpp), repeated for the bare run.
 constexpr const char* kScratchPragmas =
-    "PRAGMA journal_mode=OFF; PRAGMA synchronous=OFF; PRAGMA temp_store=MEMORY;"
-    " PRAGMA cache_size=-65536; PRAGMA ignore_check_constraints=ON;";
+    "PRAGMA journal_mode=OFF; PRAGMA synchronous=OFF; PRAGMA temp_store=FILE;"
+    " PRAGMA cache_size=-8192; PRAGMA ignore_check_constraints=ON;";
 
 // Best times over the runs, wall clock and this thread's processor time. On a shared machine
 // the processor time is the steadier measure of the work done.

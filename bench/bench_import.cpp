@@ -341,8 +341,8 @@ void BareAppends(const Captured& captured) {
   sqlite3_open(path.c_str(), &db);
   db::RegisterHebrewCollation(db);
   sqlite3_exec(db,
-               "PRAGMA journal_mode=OFF; PRAGMA synchronous=OFF; PRAGMA temp_store=MEMORY;"
-               " PRAGMA cache_size=-65536; PRAGMA ignore_check_constraints=ON; BEGIN",
+               "PRAGMA journal_mode=OFF; PRAGMA synchronous=OFF; PRAGMA temp_store=FILE;"
+               " PRAGMA cache_size=-8192; PRAGMA ignore_check_constraints=ON; BEGIN",
                nullptr, nullptr, nullptr);
   for (const CapturedTable& t : captured.tables) {
     std::string insert = "INSERT INTO \"" + t.def.name + "\" VALUES(";

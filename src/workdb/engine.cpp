@@ -44,13 +44,17 @@ constexpr std::string_view kCheckRange = "zdr_range:";
 
 // Pragmas per durability. The working database is rebuilt at every load and needs neither
 // journal nor sync; the account-selection database keeps the user's ticks.
+// The working database's page cache is 8 MB: the load appends (mostly in key order) and runs as
+// fast with it as with 64 MB, and the sorter of a selection spills to its file beyond the same
+// size. Temporary tables and sort runs go to files, so a selection of any size (and the
+// snapshot that keeps its rows, see OpenSnapshot) takes no more memory than that.
 // Both leave the CHECK constraints unevaluated on the connection: a table recordset checks
 // every row it appends itself, before binding it, and paying the same checks again in SQLite
 // was a third of an account load. Statements that may write (Execute, and a snapshot of a
 // statement that is not read-only) run under EnforcedChecks instead.
 constexpr const char* kScratchPragmas =
-    "PRAGMA journal_mode=OFF; PRAGMA synchronous=OFF; PRAGMA temp_store=MEMORY;"
-    " PRAGMA cache_size=-65536; PRAGMA ignore_check_constraints=ON;";
+    "PRAGMA journal_mode=OFF; PRAGMA synchronous=OFF; PRAGMA temp_store=FILE;"
+    " PRAGMA cache_size=-8192; PRAGMA ignore_check_constraints=ON;";
 constexpr const char* kDurablePragmas =
     "PRAGMA journal_mode=DELETE; PRAGMA synchronous=FULL; PRAGMA ignore_check_constraints=ON;";
 
@@ -395,6 +399,7 @@ struct Database::Impl {
   // Stored queries whose view could not be made at open, with the reason.
   std::vector<std::pair<std::string, std::string>> brokenQueries;
   int nextLinkSchema = 1;
+  int nextSpool = 1;
 
   sqlite3* db() const {
     if (!conn) throw EngineError(kErrEngine, "מסד הנתונים סגור.");
@@ -1425,6 +1430,22 @@ T ReadRaw(const unsigned char*& p) {
 }  // namespace
 
 struct Snapshot::Impl {
+  // A forward snapshot reads its rows back from a temporary table (the spool) as it moves,
+  // through the connection it keeps.
+  bool forward = false;
+  std::shared_ptr<Connection> conn;
+  sqlite3_stmt* stmt = nullptr;
+  std::string spool;
+  int64_t total = 0;
+  std::string shownSql;
+  bool empty = false;  // forward: the statement gave no row at all
+  bool done = false;   // forward: moved past the last row
+
+  Impl() = default;
+  Impl(const Impl&) = delete;
+  Impl& operator=(const Impl&) = delete;
+  ~Impl() { Release(); }
+
   std::vector<std::string> names;
   std::vector<std::string> tables;  // the source table of a plain column, else empty
   // Rows one after the other: per cell a tag, then 8 bytes of number or a 4-byte length
@@ -1436,6 +1457,64 @@ struct Snapshot::Impl {
   std::vector<Value> current;
 
   int64_t RowCount() const { return static_cast<int64_t>(rowStart.size()); }
+
+  void Release() {
+    sqlite3_finalize(stmt);
+    stmt = nullptr;
+    if (conn && !spool.empty()) {
+      sqlite3_exec(conn->db, ("DROP TABLE temp." + QuoteId(spool)).c_str(), nullptr, nullptr,
+                   nullptr);
+    }
+    spool.clear();
+    conn.reset();
+  }
+
+  // Forward: the statement's next row into `current`, or past the end.
+  void StepForward() {
+    const int rc = sqlite3_step(stmt);
+    if (rc == SQLITE_ROW) {
+      ++pos;
+      visited = pos + 1;
+      for (int c = 0; c < static_cast<int>(current.size()); ++c) {
+        Value& v = current[static_cast<size_t>(c)];
+        switch (sqlite3_column_type(stmt, c)) {
+          case SQLITE_NULL:
+            v = std::monostate{};
+            break;
+          case SQLITE_INTEGER:
+            v = static_cast<int64_t>(sqlite3_column_int64(stmt, c));
+            break;
+          case SQLITE_FLOAT:
+            v = sqlite3_column_double(stmt, c);
+            break;
+          default: {
+            const auto* text = reinterpret_cast<const char*>(sqlite3_column_text(stmt, c));
+            const auto n = static_cast<size_t>(sqlite3_column_bytes(stmt, c));
+            if (auto* str = std::get_if<std::string>(&v)) {
+              str->assign(text, n);
+            } else {
+              v = std::string(text, n);
+            }
+            break;
+          }
+        }
+      }
+      return;
+    }
+    done = true;
+    ++pos;
+    if (rc == SQLITE_DONE) {
+      Release();
+      return;
+    }
+    const EngineError failure = StepFailure(conn->db, rc, shownSql);
+    Release();
+    throw failure;
+  }
+
+  [[noreturn]] static void ForwardOnly() {
+    throw EngineError(kErrForwardOnly, "הרשומות נקראות קדימה בלבד: אין חזרה לרשומה קודמת.");
+  }
 
   void MoveTo(int64_t p) {
     pos = p;
@@ -1468,7 +1547,9 @@ struct Snapshot::Impl {
   }
 
   void RequireRows() const {
-    if (rowStart.empty()) throw EngineError(kErrNoCurrentRecord, "אין רשומה נוכחית.");
+    if (forward ? empty : rowStart.empty()) {
+      throw EngineError(kErrNoCurrentRecord, "אין רשומה נוכחית.");
+    }
   }
 };
 
@@ -1477,11 +1558,55 @@ Snapshot::Snapshot(Snapshot&&) noexcept = default;
 Snapshot& Snapshot::operator=(Snapshot&&) noexcept = default;
 Snapshot::~Snapshot() = default;
 
-Snapshot Database::OpenSnapshot(std::string_view jetSql) {
+Snapshot Database::OpenSnapshot(std::string_view jetSql, SnapshotKind kind) {
   if (!impl_) throw EngineError(kErrEngine, "מסד הנתונים סגור.");
   const std::string sql = TranslateJetSql(jetSql);
   Statement st;
   impl_->Prepare(sql, st, jetSql);
+  if (kind == SnapshotKind::Forward && sqlite3_stmt_readonly(st.get())) {
+    auto snap = std::make_unique<Snapshot::Impl>();
+    snap->forward = true;
+    snap->shownSql = jetSql;
+    const int columns = sqlite3_column_count(st.get());
+    for (int c = 0; c < columns; ++c) {
+      const char* name = sqlite3_column_name(st.get(), c);
+      const char* table = sqlite3_column_table_name(st.get(), c);
+      snap->names.emplace_back(name != nullptr ? name : "");
+      snap->tables.emplace_back(table != nullptr ? table : "");
+    }
+    snap->current.resize(static_cast<size_t>(columns));
+    // The rows go once into a temporary table, in the statement's order; the working database
+    // keeps temporary tables in a file, so they take no memory however many there are. The
+    // count comes from there, and the rows are read back one at a time.
+    const std::string spool = "zdr_snapshot_" + std::to_string(impl_->nextSpool++);
+    {
+      Statement create;
+      impl_->Prepare("CREATE TEMP TABLE " + QuoteId(spool) + " AS " + sql, create, jetSql);
+      const int rc = sqlite3_step(create.get());
+      if (rc != SQLITE_DONE) throw StepFailure(impl_->db(), rc, jetSql);
+    }
+    snap->conn = impl_->conn;
+    snap->spool = spool;
+    {
+      Statement count;
+      const std::string countSql = "SELECT count(*) FROM temp." + QuoteId(spool);
+      impl_->Prepare(countSql, count, countSql);
+      if (sqlite3_step(count.get()) != SQLITE_ROW) {
+        throw StepFailure(impl_->db(), sqlite3_errcode(impl_->db()), countSql);
+      }
+      snap->total = sqlite3_column_int64(count.get(), 0);
+    }
+    Statement read;
+    const std::string readSql = "SELECT * FROM temp." + QuoteId(spool) + " ORDER BY rowid";
+    impl_->Prepare(readSql, read, readSql);
+    std::swap(snap->stmt, *read.out());
+    snap->StepForward();
+    if (snap->done) {
+      snap->empty = true;
+      snap->pos = -1;
+    }
+    return Snapshot(std::move(snap));
+  }
   // A statement that writes is made again with the field rules in force.
   std::optional<EnforcedChecks> checks;
   if (!sqlite3_stmt_readonly(st.get())) {
@@ -1534,34 +1659,50 @@ Snapshot Database::OpenSnapshot(std::string_view jetSql) {
 }
 
 bool Snapshot::AtStart() const {
+  if (impl_->forward) return impl_->empty;
   return impl_->pos < 0 || impl_->rowStart.empty();
 }
 bool Snapshot::AtEnd() const {
+  if (impl_->forward) return impl_->done;
   return impl_->rowStart.empty() || impl_->pos >= impl_->RowCount();
 }
 
 void Snapshot::MoveFirst() {
   impl_->RequireRows();
+  if (impl_->forward) {
+    if (impl_->pos != 0 || impl_->done) Impl::ForwardOnly();
+    return;
+  }
   impl_->MoveTo(0);
 }
 
 void Snapshot::MoveLast() {
   impl_->RequireRows();
+  if (impl_->forward) Impl::ForwardOnly();
   impl_->MoveTo(impl_->RowCount() - 1);
 }
 
 void Snapshot::MoveNext() {
   if (AtEnd()) throw EngineError(kErrNoCurrentRecord, "אין רשומה נוכחית.");
+  if (impl_->forward) {
+    impl_->StepForward();
+    return;
+  }
   impl_->MoveTo(impl_->pos + 1);
 }
 
 void Snapshot::MovePrevious() {
   if (AtStart()) throw EngineError(kErrNoCurrentRecord, "אין רשומה נוכחית.");
+  if (impl_->forward) Impl::ForwardOnly();
   impl_->MoveTo(impl_->pos - 1);
 }
 
 int64_t Snapshot::RecordCount() const {
   return impl_->visited;
+}
+
+int64_t Snapshot::TotalRows() const {
+  return impl_->forward ? impl_->total : impl_->RowCount();
 }
 
 int Snapshot::FieldIndex(std::string_view name) const {
@@ -1620,6 +1761,11 @@ const std::string& Snapshot::FieldName(int index) const {
 void Snapshot::Close() {
   if (!impl_) return;
   Impl& s = *impl_;
+  if (s.forward) {
+    s.Release();
+    s.empty = s.done = true;
+    s.total = 0;
+  }
   s.cells.clear();
   s.cells.shrink_to_fit();
   s.rowStart.clear();

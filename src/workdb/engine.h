@@ -38,6 +38,7 @@ inline constexpr int kErrObjectExists = 3012;     // table, link or query name a
 inline constexpr int kErrNotEditing = 3020;       // field set or Update without AddNew
 inline constexpr int kErrNullKey = 3058;          // Null in a field of the primary index
 inline constexpr int kErrTypeConversion = 3421;   // value cannot become the field's type
+inline constexpr int kErrForwardOnly = 3219;      // move back in a forward-only snapshot
 
 class EngineError : public std::runtime_error {
  public:
@@ -134,9 +135,20 @@ class TableRecordset {
   std::unique_ptr<Impl> impl_;
 };
 
-// The rows of a statement, read whole when it is opened; it needs no open database after
-// that. It starts on the first row (at start and at end together when there is none). Moving past
-// either end, or MoveFirst/MoveLast with no rows, throws kErrNoCurrentRecord.
+// How a snapshot holds the rows of its statement.
+enum class SnapshotKind {
+  // Read whole when opened: every move is allowed, and no open database is needed after that.
+  Whole,
+  // Kept in a temporary file when opened and read back one row at a time as the snapshot
+  // moves forward, so memory stays flat however many rows there are. Only MoveNext moves
+  // (MoveFirst is allowed while on the first row); the snapshot keeps the database's
+  // connection until it is closed. For statements that only read (others are read whole).
+  Forward,
+};
+
+// The rows of a statement. It starts on the first row (at start and at end together when there
+// is none). Moving past either end, or MoveFirst/MoveLast with no rows, throws
+// kErrNoCurrentRecord; moving back in a forward snapshot throws kErrForwardOnly.
 class Snapshot {
  public:
   Snapshot(Snapshot&&) noexcept;
@@ -151,6 +163,8 @@ class Snapshot {
   void MovePrevious();
   // Rows seen so far: complete after MoveLast, as with the desktop engine.
   int64_t RecordCount() const;
+  // Every row of the statement, known from the moment the snapshot opens.
+  int64_t TotalRows() const;
   // Column index by result name, without regard to case; throws kErrNoSuchField. A
   // qualified name ("tStockHead.Reference1") finds the column Reference1 of that table.
   int FieldIndex(std::string_view name) const;
@@ -204,7 +218,7 @@ class Database {
   // Runs a statement that changes rows (Jet SQL). Returns the number of rows changed.
   int64_t Execute(std::string_view jetSql);
   TableRecordset OpenTable(const std::string& table);
-  Snapshot OpenSnapshot(std::string_view jetSql);
+  Snapshot OpenSnapshot(std::string_view jetSql, SnapshotKind kind = SnapshotKind::Whole);
 
   // The table's definition as created (fields and indexes), for tests and tools.
   TableDef Describe(const std::string& table);

@@ -502,6 +502,59 @@ TEST_F(SnapshotTest, EmptyResultIsAtBothEnds) {
   EXPECT_EQ(s.FieldCount(), 1);
 }
 
+// A forward snapshot gives the whole snapshot's rows in its order, knows their number at once,
+// refuses to move back, and leaves nothing behind in the database.
+TEST_F(SnapshotTest, ForwardSnapshotStreamsTheSameRowsAndCountsThemAtOpen) {
+  const char* sql = "SELECT AccountKey, City FROM tAccount ORDER BY AccountName DESC";
+  std::vector<std::string> whole;
+  for (Snapshot w = db_->OpenSnapshot(sql); !w.AtEnd(); w.MoveNext()) {
+    whole.push_back(std::get<std::string>(w.Field("AccountKey")));
+  }
+  Snapshot f = db_->OpenSnapshot(sql, SnapshotKind::Forward);
+  EXPECT_EQ(f.TotalRows(), 3);
+  EXPECT_EQ(f.RecordCount(), 1);
+  f.MoveFirst();  // already there
+  db_->Close();   // the snapshot keeps the connection it reads through
+  std::vector<std::string> forward;
+  std::vector<bool> cityNull;
+  for (; !f.AtEnd(); f.MoveNext()) {
+    forward.push_back(std::get<std::string>(f.Field("AccountKey")));
+    cityNull.push_back(IsNull(f.Field(1)));
+    if (forward.size() == 2) {
+      EXPECT_EQ(ErrorOf([&] { f.MovePrevious(); }), kErrForwardOnly);
+      EXPECT_EQ(ErrorOf([&] { f.MoveFirst(); }), kErrForwardOnly);
+      EXPECT_EQ(ErrorOf([&] { f.MoveLast(); }), kErrForwardOnly);
+    }
+  }
+  EXPECT_EQ(forward, whole);
+  EXPECT_EQ(cityNull, (std::vector<bool>{false, true, false}));
+  EXPECT_EQ(f.RecordCount(), 3);
+  EXPECT_EQ(ErrorOf([&] { f.MoveNext(); }), kErrNoCurrentRecord);
+
+  Database again = Database::Open(File("s.DB"));
+  Snapshot empty = again.OpenSnapshot("SELECT AccountKey FROM tAccount WHERE AccountKey = \"9\"",
+                                      SnapshotKind::Forward);
+  EXPECT_TRUE(empty.AtStart());
+  EXPECT_TRUE(empty.AtEnd());
+  EXPECT_EQ(empty.TotalRows(), 0);
+  EXPECT_EQ(ErrorOf([&] { empty.MoveFirst(); }), kErrNoCurrentRecord);
+  // Each forward snapshot keeps its rows in a temporary table until it is done with them.
+  Snapshot open = again.OpenSnapshot(sql, SnapshotKind::Forward);
+  auto spools = [&] {
+    sqlite3_stmt* st = nullptr;
+    sqlite3_prepare_v2(again.Handle(),
+                       "SELECT count(*) FROM sqlite_temp_master WHERE type = 'table'", -1, &st,
+                       nullptr);
+    sqlite3_step(st);
+    const int n = sqlite3_column_int(st, 0);
+    sqlite3_finalize(st);
+    return n;
+  };
+  EXPECT_EQ(spools(), 1);
+  open.Close();
+  EXPECT_EQ(spools(), 0);
+}
+
 TEST_F(SnapshotTest, NullFieldsAndBooleansReadBack) {
   Snapshot s = db_->OpenSnapshot(
       "SELECT City, Include, CategoryCode, SortByKeyVal FROM tAccount WHERE AccountKey = "
