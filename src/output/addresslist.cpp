@@ -59,7 +59,8 @@ void CreateHTML(const std::string& pFileName, const std::string& pDBFile, const 
   WriteListHead(f, today);
 
   db::Database database = db::Database::Open(pDBFile);
-  db::Snapshot rs = database.OpenSnapshot(BuildRecipientsStatement(panel, docTypes, selectDbPath));
+  db::Snapshot rs = database.OpenSnapshot(BuildRecipientsStatement(panel, docTypes, selectDbPath),
+                                          db::SnapshotKind::Forward);
   if (rs.AtStart() || rs.AtEnd()) {  // either, right after opening: no rows
     // No recipients: the page stops after the column headings.
     f.Close();
@@ -69,9 +70,7 @@ void CreateHTML(const std::string& pFileName, const std::string& pDBFile, const 
   // value from leaving half a list behind.
   const SheetGeometry g = ReadSheetGeometry(panel, false);
 
-  rs.MoveLast();
-  const int64_t count = rs.RecordCount();
-  rs.MoveFirst();
+  const int64_t count = rs.TotalRows();
   const int zip = rs.FieldIndex("Zip");
   const int city = rs.FieldIndex("City");
   const int address = rs.FieldIndex("Address");

@@ -132,13 +132,13 @@ void CreateCSV(const std::string& pFileName, const std::string& pDBFile, int16_t
   ProgressReporter started(ui, 1);
 
   db::Database database = db::Database::Open(pDBFile);
-  db::Snapshot rs = database.OpenSnapshot(BuildRecipientsStatement(panel, docTypes, selectDbPath));
+  db::Snapshot rs = database.OpenSnapshot(BuildRecipientsStatement(panel, docTypes, selectDbPath),
+                                          db::SnapshotKind::Forward);
   if (rs.AtStart() || rs.AtEnd()) {  // either, right after opening: no rows
     f.Close();                       // no recipients: an empty file, not even a header
     return;
   }
-  rs.MoveLast();
-  const int64_t count = rs.RecordCount();
+  const int64_t count = rs.TotalRows();
   if (pFileFormat != 0 && pFileFormat != 1) {
     f.Close();
     return;
@@ -154,7 +154,6 @@ void CreateCSV(const std::string& pFileName, const std::string& pDBFile, int16_t
   const DispatchFields fields(rs);
 
   ProgressReporter progress(ui, static_cast<double>(count));
-  rs.MoveFirst();
   int64_t rows = 0;
   std::string line;
   while (!rs.AtEnd()) {

@@ -224,15 +224,16 @@ void CreateLabFile(const std::string& pFileName, const std::string& pDBFile, con
   f.Line("<BODY BGCOLOR='#FFFFFF'>");
 
   db::Database database = db::Database::Open(pDBFile);
-  db::Snapshot rs = database.OpenSnapshot(BuildRecipientsStatement(panel, docTypes, selectDbPath));
+  // The rows are read as the sheet is written; their number, which fixes the pages, is known
+  // when the snapshot opens.
+  db::Snapshot rs = database.OpenSnapshot(BuildRecipientsStatement(panel, docTypes, selectDbPath),
+                                          db::SnapshotKind::Forward);
   if (rs.AtStart() || rs.AtEnd()) {  // either, right after opening: no rows
     // No recipients: the page stops after the BODY line.
     f.Close();
     return;
   }
-  rs.MoveLast();
-  const int64_t count = rs.RecordCount();
-  rs.MoveFirst();
+  const int64_t count = rs.TotalRows();
 
   // A start position below 1 means the first cell; counting it as such keeps the last
   // recipients from falling off the sheet.

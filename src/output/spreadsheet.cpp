@@ -49,23 +49,25 @@ void SplitCsvLine(std::string_view line, std::vector<std::string>& cells) {
   cells.resize(n);
 }
 
-// The dispatch file's lines, decoded to UTF-8.
-std::vector<std::string> ReadCsvLines(const std::string& path) {
-  std::ifstream in(path, std::ios::binary);
-  if (!in) throw OutputError("לא ניתן לקרוא את הקובץ " + path);
-  const std::string bytes((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
-  std::vector<std::string> lines;
-  size_t from = 0;
-  while (from < bytes.size()) {
-    size_t end = bytes.find('\n', from);
-    const size_t next = end == std::string::npos ? bytes.size() : end + 1;
-    if (end == std::string::npos) end = bytes.size();
-    if (end > from && bytes[end - 1] == '\r') --end;
-    lines.push_back(Win1255ToUtf8(std::string_view(bytes).substr(from, end - from)));
-    from = next;
+// The dispatch file read line by line, decoded to UTF-8; a workbook is written from it in two
+// passes (the column widths, then the cells), so memory does not grow with the file.
+class CsvLineReader {
+ public:
+  explicit CsvLineReader(const std::string& path) : in_(path, std::ios::binary) {
+    if (!in_) throw OutputError("לא ניתן לקרוא את הקובץ " + path);
   }
-  return lines;
-}
+  bool Next(std::string& line) {
+    if (!std::getline(in_, raw_)) return false;
+    if (!raw_.empty() && raw_.back() == '\r') raw_.pop_back();
+    line.clear();
+    AppendWin1255AsUtf8(raw_, line);
+    return true;
+  }
+
+ private:
+  std::ifstream in_;
+  std::string raw_;
+};
 
 bool ParseNumber(const std::string& text, double& out) {
   const size_t b = text.find_first_not_of(' ');
@@ -120,17 +122,17 @@ lxw_error WriteFindingsSheet(lxw_workbook* wb, const std::vector<Finding>& findi
   return err;
 }
 
-void WriteXlsx(const std::vector<std::string>& lines, const std::string& xlsxPath, bool rightToLeft,
+void WriteXlsx(const std::string& csvPath, const std::string& xlsxPath, bool rightToLeft,
                const std::vector<Finding>& findings, bool showFindings) {
   // The reference column is numeric; which column it is depends on the layout.
   int numericCol = -1;
-  if (!lines.empty()) {
-    if (lines[0] == kPostILHeader0) numericCol = 0;
-    if (lines[0] == kPostILHeader1) numericCol = 10;
-  }
   std::vector<size_t> widths;
   std::vector<std::string> cells;
-  for (const std::string& line : lines) {
+  std::string line;
+  CsvLineReader widthPass(csvPath);
+  for (bool first = true; widthPass.Next(line); first = false) {
+    if (first && line == kPostILHeader0) numericCol = 0;
+    if (first && line == kPostILHeader1) numericCol = 10;
     SplitCsvLine(line, cells);
     if (widths.size() < cells.size()) widths.resize(cells.size(), 0);
     for (size_t c = 0; c < cells.size(); ++c) {
@@ -153,8 +155,9 @@ void WriteXlsx(const std::vector<std::string>& lines, const std::string& xlsxPat
     worksheet_set_column(ws, static_cast<lxw_col_t>(c), static_cast<lxw_col_t>(c), width, nullptr);
   }
   lxw_error err = LXW_NO_ERROR;
-  for (size_t r = 0; r < lines.size() && err == LXW_NO_ERROR; ++r) {
-    SplitCsvLine(lines[r], cells);
+  CsvLineReader cellPass(csvPath);
+  for (size_t r = 0; err == LXW_NO_ERROR && cellPass.Next(line); ++r) {
+    SplitCsvLine(line, cells);
     for (size_t c = 0; c < cells.size() && err == LXW_NO_ERROR; ++c) {
       const std::string& cell = cells[c];
       if (cell.empty()) continue;
@@ -302,9 +305,8 @@ class PendingFile {
   fs::path path_;
 };
 
-void ConvertWithOffice(const std::vector<std::string>& lines, const fs::path& target,
-                       const fs::path& into, bool rightToLeft, const std::vector<Finding>& findings,
-                       bool showFindings) {
+void ConvertWithOffice(const std::string& csvPath, const fs::path& target, const fs::path& into,
+                       bool rightToLeft, const std::vector<Finding>& findings, bool showFindings) {
   const std::string office = FindOffice();
   if (office.empty()) {
     throw OutputError("לא נמצאה תוכנה שממירה לתבנית " + target.extension().string() +
@@ -324,7 +326,7 @@ void ConvertWithOffice(const std::vector<std::string>& lines, const fs::path& ta
   } cleanup{work};
 
   const fs::path xlsx = work / (target.stem().string() + ".xlsx");
-  WriteXlsx(lines, xlsx.string(), rightToLeft, findings, showFindings);
+  WriteXlsx(csvPath, xlsx.string(), rightToLeft, findings, showFindings);
   const fs::path outDir = work / "out";
   fs::create_directories(outDir);
   const std::string ext = target.extension().string().substr(1);
@@ -381,14 +383,14 @@ void ConvertToExcel(const std::string& pCsvFile, const std::string& pXlsFile, bo
                     UserSeam& ui, const std::string& companyPath,
                     const std::vector<Finding>& findings, bool showFindings) {
   CheckWorkbookTarget(pXlsFile, companyPath);
-  const std::vector<std::string> lines = ReadCsvLines(pCsvFile);
+  { const CsvLineReader readable(pCsvFile); }  // a missing file is reported before writing
   const fs::path target = PathFromUtf8(pXlsFile);
   // Written beside the file a link points to, so the link keeps pointing at the workbook.
   PendingFile pending(Resolved(target));
   if (Lower(target.extension().string()) == ".xlsx") {
-    WriteXlsx(lines, pending.path().string(), pOpenExcel, findings, showFindings);
+    WriteXlsx(pCsvFile, pending.path().string(), pOpenExcel, findings, showFindings);
   } else {
-    ConvertWithOffice(lines, target, pending.path(), pOpenExcel, findings, showFindings);
+    ConvertWithOffice(pCsvFile, target, pending.path(), pOpenExcel, findings, showFindings);
   }
   pending.Commit();
   if (pOpenExcel && !ui.OpenInSpreadsheet(pXlsFile)) {
