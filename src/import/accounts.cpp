@@ -152,7 +152,7 @@ bool AccountCriteria::Pass(std::string_view rec, std::string& keyBuf) const {
 // Writes the accepted accounts; one per target table layout.
 class AccountWriter {
  public:
-  AccountWriter(db::TableRecordset& rs, bool allDetails, bool asIs)
+  AccountWriter(importing::RowTarget& rs, bool allDetails, bool asIs)
       : rs_(rs),
         allDetails_(allDetails),
         asIs_(asIs),
@@ -220,11 +220,11 @@ class AccountWriter {
     }
     sortByName_.SetOr(rs_, nameText_, " ");
     rs_.SetBool(include_, true);
-    importing::UpdatePassingDuplicates(rs_);
+    rs_.UpdatePassingDuplicates();
   }
 
  private:
-  db::TableRecordset& rs_;
+  importing::RowTarget& rs_;
   bool allDetails_, asIs_;
   TextColumn key_, sortByKey_, sortByName_;
   int include_;
@@ -249,16 +249,20 @@ bool ReadACT(const std::string& CompPath, const std::string& pDBFile, bool pAllD
 
     db::Database db = db::Database::Open(pDBFile);
     db::TableRecordset rs = db.OpenTable(pAllDetails ? "tAccount" : "tSelectAccount");
-    AccountWriter writer(rs, pAllDetails, pAsIs);
+    importing::ImportPipeline pipeline(progress);
+    AccountWriter writer(pipeline.Add(rs), pAllDetails, pAsIs);
     std::string keyBuf;
 
-    for (int64_t n = 2; n <= last; ++n) {
-      std::string_view rec = importing::RecordOf(file, n);
-      if (!IsDeleted(FieldOf(rec, kKeyAt, kKeyLen)) && criteria.Pass(rec, keyBuf)) {
-        writer.Write(rec);
+    pipeline.Run([&] {
+      for (int64_t n = 2; n <= last; ++n) {
+        std::string_view rec = importing::RecordOf(file, n);
+        if (!IsDeleted(FieldOf(rec, kKeyAt, kKeyLen)) && criteria.Pass(rec, keyBuf)) {
+          writer.Write(rec);
+        }
+        if (n % 5 == 0) pipeline.Progress(static_cast<double>(n));
+        pipeline.RecordDone();
       }
-      if (n % 5 == 0) progress.Update(static_cast<double>(n));
-    }
+    });
     rs.Close();
     db.Close();
     return true;

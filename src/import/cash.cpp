@@ -40,28 +40,33 @@ int16_t ReadCash(const std::string& CompPath, const std::string& pDBFile, const 
 
     ProgressReporter progress(ui, static_cast<double>(n));
     db::Database db = db::Database::Open(pDBFile);
-    db::TableRecordset rs = db.OpenTable("tCash");
+    db::TableRecordset table = db.OpenTable("tCash");
+    importing::ImportPipeline pipeline(progress);
+    importing::RowTarget& rs = pipeline.Add(table);
     const int transId = rs.FieldIndex("TransID");
     importing::TextColumn account(rs, "AccountKey");
     std::string key;  // reused from record to record
 
-    for (int64_t i = 1; i <= n; ++i) {
-      std::string_view rec = importing::RecordOf(file, i);
-      const Date date = importing::DateAt(rec, kDateAt);
-      if (!(from && date < *from) && !(to && date > *to)) {
-        // Keys match tAccount's: converted as the account import of this load converts them.
-        ConvertForDisplay(FieldOf(rec, kKeyAt, kKeyLen), pAsIs, key);
-        std::string_view trimmed = TrimSpaces(key);
-        if (!trimmed.empty()) {
-          rs.AddNew();
-          rs.SetInt(transId, i);
-          account.Set(rs, trimmed);
-          importing::UpdatePassingDuplicates(rs);
+    pipeline.Run([&] {
+      for (int64_t i = 1; i <= n; ++i) {
+        std::string_view rec = importing::RecordOf(file, i);
+        const Date date = importing::DateAt(rec, kDateAt);
+        if (!(from && date < *from) && !(to && date > *to)) {
+          // Keys match tAccount's: converted as the account import of this load converts them.
+          ConvertForDisplay(FieldOf(rec, kKeyAt, kKeyLen), pAsIs, key);
+          std::string_view trimmed = TrimSpaces(key);
+          if (!trimmed.empty()) {
+            rs.AddNew();
+            rs.SetInt(transId, i);
+            account.Set(rs, trimmed);
+            rs.UpdatePassingDuplicates();
+          }
         }
+        if (i % 5 == 0) pipeline.Progress(static_cast<double>(i));
+        pipeline.RecordDone();
       }
-      if (i % 5 == 0) progress.Update(static_cast<double>(i));
-    }
-    rs.Close();
+    });
+    table.Close();
     db.Close();
     return -1;
   } catch (const std::exception& e) {

@@ -3,6 +3,8 @@
 #include <cmath>
 #include <cstdlib>
 #include <limits>
+#include <system_error>
+#include <thread>
 
 #include "import/codepage.h"
 #include "import/hosttext.h"
@@ -136,10 +138,167 @@ void UpdatePassingDuplicates(db::TableRecordset& rs) {
   }
 }
 
-void TextColumn::Set(db::TableRecordset& rs, std::string_view win1255) {
-  buf_.clear();
-  AppendWin1255AsUtf8(win1255, buf_);
-  rs.SetText(index_, buf_);
+void RowTarget::SetDouble(int field, double v) {
+  int64_t bits;
+  std::memcpy(&bits, &v, sizeof v);
+  Batch().Add(RowBatch::Op::Double, table_, field, bits);
+}
+
+void RowTarget::SetText(int field, std::string_view utf8) {
+  RowBatch& b = Batch();
+  const size_t at = b.text_.size();
+  b.text_.append(utf8);
+  b.Add(RowBatch::Op::Text, table_, field, static_cast<int64_t>(at),
+        static_cast<uint32_t>(utf8.size()));
+}
+
+void RowTarget::SetWin1255(int field, std::string_view win1255) {
+  RowBatch& b = Batch();
+  const size_t at = b.text_.size();
+  AppendWin1255AsUtf8(win1255, b.text_);
+  b.Add(RowBatch::Op::Text, table_, field, static_cast<int64_t>(at),
+        static_cast<uint32_t>(b.text_.size() - at));
+}
+
+ImportPipeline::ImportPipeline(ProgressReporter& progress) : progress_(progress) {}
+
+ImportPipeline::~ImportPipeline() = default;
+
+RowTarget& ImportPipeline::Add(db::TableRecordset& rs) {
+  tables_.push_back(&rs);
+  targets_.push_back(std::unique_ptr<RowTarget>(
+      new RowTarget(*this, rs, static_cast<uint8_t>(tables_.size() - 1))));
+  return *targets_.back();
+}
+
+void ImportPipeline::Write(const RowBatch& batch) {
+  for (const RowBatch::Entry& e : batch.entries_) {
+    db::TableRecordset& rs = *tables_[e.table];
+    switch (e.op) {
+      case RowBatch::Op::AddNew:
+        rs.AddNew();
+        break;
+      case RowBatch::Op::Int:
+        rs.SetInt(e.field, e.value);
+        break;
+      case RowBatch::Op::Double: {
+        double d;
+        std::memcpy(&d, &e.value, sizeof d);
+        rs.SetDouble(e.field, d);
+        break;
+      }
+      case RowBatch::Op::Bool:
+        rs.SetBool(e.field, e.value != 0);
+        break;
+      case RowBatch::Op::Date:
+        rs.SetDate(e.field, Date{static_cast<int32_t>(e.value)});
+        break;
+      case RowBatch::Op::Text:
+        rs.SetText(e.field,
+                   std::string_view(batch.text_).substr(static_cast<size_t>(e.value), e.len));
+        break;
+      case RowBatch::Op::Update:
+        rs.Update();
+        break;
+      case RowBatch::Op::UpdatePassing:
+        UpdatePassingDuplicates(rs);
+        break;
+      case RowBatch::Op::Progress: {
+        double done;
+        std::memcpy(&done, &e.value, sizeof done);
+        progress_.Update(done);
+        break;
+      }
+    }
+  }
+}
+
+void ImportPipeline::HandOver(bool last) {
+  current_->last_ = last;
+  if (!threaded_) {
+    // One thread: write the batch at once and fill it again.
+    Write(*current_);
+    if (current_->failure_) std::rethrow_exception(current_->failure_);
+    current_->Clear();
+    return;
+  }
+  std::unique_lock<std::mutex> lock(mutex_);
+  full_.push_back(current_);
+  changed_.notify_all();
+  if (last) return;
+  changed_.wait(lock, [this] { return stop_ || !free_.empty(); });
+  if (stop_) throw Stopped{};
+  current_ = free_.front();
+  free_.pop_front();
+  current_->Clear();
+}
+
+void ImportPipeline::Run(const std::function<void()>& convert) {
+  for (RowBatch& b : batches_) b.Clear();
+  current_ = &batches_[0];
+  full_.clear();
+  free_.clear();
+  for (size_t i = 1; i < kBatches; ++i) free_.push_back(&batches_[i]);
+  stop_ = false;
+
+  auto converting = [this, &convert] {
+    try {
+      convert();
+    } catch (const Stopped&) {
+      return;
+    } catch (...) {
+      current_->failure_ = std::current_exception();
+    }
+    HandOver(true);
+  };
+
+  std::thread thread;
+  threaded_ = true;
+  try {
+    thread = std::thread(converting);
+  } catch (const std::system_error&) {
+    threaded_ = false;
+  }
+  if (!threaded_) {
+    try {
+      convert();
+    } catch (...) {
+      current_->failure_ = std::current_exception();
+    }
+    HandOver(true);
+    return;
+  }
+
+  for (;;) {
+    RowBatch* batch;
+    {
+      std::unique_lock<std::mutex> lock(mutex_);
+      changed_.wait(lock, [this] { return !full_.empty(); });
+      batch = full_.front();
+      full_.pop_front();
+    }
+    try {
+      Write(*batch);
+    } catch (...) {
+      {
+        std::lock_guard<std::mutex> lock(mutex_);
+        stop_ = true;
+      }
+      changed_.notify_all();
+      thread.join();
+      throw;
+    }
+    if (batch->last_) {
+      thread.join();
+      if (batch->failure_) std::rethrow_exception(batch->failure_);
+      return;
+    }
+    {
+      std::lock_guard<std::mutex> lock(mutex_);
+      free_.push_back(batch);
+    }
+    changed_.notify_all();
+  }
 }
 
 LedgerFilter::LedgerFilter(const Panel& panel) {
@@ -191,7 +350,7 @@ JournalRange JournalRange::FromPanel(const Panel& panel) {
   return r;
 }
 
-TransactWriter::TransactWriter(db::TableRecordset& rs, bool asIs)
+TransactWriter::TransactWriter(RowTarget& rs, bool asIs)
     : rs_(rs),
       fileId_(rs.FieldIndex("FileID")),
       transId_(rs.FieldIndex("TransID")),
@@ -216,7 +375,7 @@ void TransactWriter::Add(int32_t fileId, int32_t transId, std::string_view keyFi
   rs_.SetInt(fileId_, fileId);
   rs_.SetInt(transId_, transId);
   key_.Set(rs_, trimmed);
-  UpdatePassingDuplicates(rs_);
+  rs_.UpdatePassingDuplicates();
 }
 
 }  // namespace zdr::importing

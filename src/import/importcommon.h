@@ -3,11 +3,19 @@
 // Internal to the importers.
 #pragma once
 
+#include <condition_variable>
 #include <cstdint>
+#include <cstring>
+#include <deque>
+#include <exception>
+#include <functional>
+#include <memory>
+#include <mutex>
 #include <optional>
 #include <stdexcept>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "control/panel.h"
 #include "control/userseam.h"
@@ -63,26 +71,165 @@ inline bool IsDuplicateKey(const db::EngineError& e) {
 // Saves the new row of `rs`; a row repeating a unique key is passed over.
 void UpdatePassingDuplicates(db::TableRecordset& rs);
 
-// One text column of a table recordset, with its own reused UTF-8 buffer (the buffer must stay
-// unchanged until the row is saved, so each column keeps its own).
+// ---- The import pipeline.
+//
+// An import runs on two threads: the one it is called on owns the database connection and
+// the seam, and binds and writes the rows; a second one reads the host records and converts
+// them (text conversions, bidi, criteria), recording the rows into batches. The batches pass
+// through a small ring of buffers that keep their capacity, so nothing is allocated per
+// record. The rows are written in the order they were recorded, with the progress points and
+// any failure of the conversion in their places among them, so what the database holds and
+// what the user is shown are the same as if one thread did both.
+
+class ImportPipeline;
+
+// Rows recorded for the recordsets of one import, written in order by the writing thread.
+class RowBatch {
+ public:
+  enum class Op : uint8_t {
+    AddNew,
+    Int,
+    Double,
+    Bool,
+    Date,
+    Text,
+    Update,
+    UpdatePassing,
+    Progress
+  };
+  struct Entry {
+    Op op;
+    uint8_t table;
+    int16_t field;
+    uint32_t len;   // text: its length in bytes
+    int64_t value;  // a whole number, a Boolean, a date's serial, a text's offset, the bits of
+                    // a double
+  };
+
+  void Clear() {
+    entries_.clear();
+    text_.clear();
+    last_ = false;
+    failure_ = nullptr;
+  }
+  bool Full() const { return entries_.size() >= kEntries || text_.size() >= kTextBytes; }
+
+ private:
+  friend class ImportPipeline;
+  friend class RowTarget;
+  static constexpr size_t kEntries = 16384;
+  static constexpr size_t kTextBytes = 512 * 1024;
+
+  void Add(Op op, uint8_t table, int field, int64_t value, uint32_t len = 0) {
+    entries_.push_back({op, table, static_cast<int16_t>(field), len, value});
+  }
+
+  std::vector<Entry> entries_;
+  std::string text_;  // the texts of the batch, UTF-8, one after the other
+  bool last_ = false;
+  std::exception_ptr failure_;  // raised after the batch's rows are written
+};
+
+// One recordset of a pipeline as the converting thread sees it: the recordset's own calls,
+// recorded into the current batch.
+class RowTarget {
+ public:
+  // Index of a field by name (kErrNoSuchField when the table has none).
+  int FieldIndex(std::string_view name) const { return rs_.FieldIndex(name); }
+  void AddNew() { Batch().Add(RowBatch::Op::AddNew, table_, 0, 0); }
+  void SetInt(int field, int64_t v) { Batch().Add(RowBatch::Op::Int, table_, field, v); }
+  void SetDouble(int field, double v);
+  void SetBool(int field, bool v) { Batch().Add(RowBatch::Op::Bool, table_, field, v ? 1 : 0); }
+  void SetDate(int field, Date d) { Batch().Add(RowBatch::Op::Date, table_, field, d.serial); }
+  void SetText(int field, std::string_view utf8);
+  // Windows-1255 text, converted to UTF-8 straight into the batch.
+  void SetWin1255(int field, std::string_view win1255);
+  // Saves the new row; a refusal ends the import.
+  void Update() { Batch().Add(RowBatch::Op::Update, table_, 0, 0); }
+  // Saves the new row; a row repeating a unique key is passed over.
+  void UpdatePassingDuplicates() { Batch().Add(RowBatch::Op::UpdatePassing, table_, 0, 0); }
+
+ private:
+  friend class ImportPipeline;
+  RowTarget(ImportPipeline& pipeline, db::TableRecordset& rs, uint8_t table)
+      : pipeline_(pipeline), rs_(rs), table_(table) {}
+  RowBatch& Batch();
+
+  ImportPipeline& pipeline_;
+  db::TableRecordset& rs_;
+  uint8_t table_;
+};
+
+class ImportPipeline {
+ public:
+  explicit ImportPipeline(ProgressReporter& progress);
+  ~ImportPipeline();
+  ImportPipeline(const ImportPipeline&) = delete;
+  ImportPipeline& operator=(const ImportPipeline&) = delete;
+
+  // A recordset the rows may go to. Add every one before Run.
+  RowTarget& Add(db::TableRecordset& rs);
+
+  // Runs `convert` on the converting thread while this thread writes what it records, and
+  // returns when both are done. What `convert` throws is raised here once the rows recorded
+  // before it are written; what writing a row throws (a refusal other than a passed-over
+  // duplicate, a full disk) stops the conversion at its next batch and is raised here.
+  // Without a second thread (none could be started) both run here, batch by batch.
+  void Run(const std::function<void()>& convert);
+
+  // For the converting thread: the share done, reported when the rows before it are written.
+  void Progress(double done) {
+    current_->Add(RowBatch::Op::Progress, 0, 0, 0);
+    std::memcpy(&current_->entries_.back().value, &done, sizeof done);
+  }
+  // For the converting thread, between records: hands the batch over when it is full.
+  void RecordDone() {
+    if (current_->Full()) HandOver(false);
+  }
+
+ private:
+  friend class RowTarget;
+  static constexpr size_t kBatches = 4;
+  struct Stopped {};  // the writing side failed: the conversion ends quietly
+
+  void HandOver(bool last);
+  void Write(const RowBatch& batch);
+
+  ProgressReporter& progress_;
+  std::vector<db::TableRecordset*> tables_;
+  std::vector<std::unique_ptr<RowTarget>> targets_;
+  RowBatch batches_[kBatches];
+  RowBatch* current_ = &batches_[0];  // being filled by the converting thread
+
+  bool threaded_ = false;
+  std::mutex mutex_;
+  std::condition_variable changed_;
+  std::deque<RowBatch*> full_, free_;
+  bool stop_ = false;
+};
+
+inline RowBatch& RowTarget::Batch() {
+  return *pipeline_.current_;
+}
+
+// One text column of a pipeline's table, taking converted host text (Windows-1255).
 class TextColumn {
  public:
-  TextColumn(db::TableRecordset& rs, std::string_view name) : index_(rs.FieldIndex(name)) {}
+  TextColumn(RowTarget& rs, std::string_view name) : index_(rs.FieldIndex(name)) {}
   // Sets Windows-1255 text, which must not be empty.
-  void Set(db::TableRecordset& rs, std::string_view win1255);
+  void Set(RowTarget& rs, std::string_view win1255) { rs.SetWin1255(index_, win1255); }
   // Sets the text, or `fallback` when it is empty.
-  void SetOr(db::TableRecordset& rs, std::string_view win1255, std::string_view fallback) {
+  void SetOr(RowTarget& rs, std::string_view win1255, std::string_view fallback) {
     Set(rs, win1255.empty() ? fallback : win1255);
   }
   // Sets the text, or leaves the field Null when it is empty.
-  void SetOrNull(db::TableRecordset& rs, std::string_view win1255) {
+  void SetOrNull(RowTarget& rs, std::string_view win1255) {
     if (!win1255.empty()) Set(rs, win1255);
   }
   int index() const { return index_; }
 
  private:
   int index_;
-  std::string buf_;
 };
 
 // The ledger criteria that both the permanent ledger and the temporary batches apply: the type
@@ -118,13 +265,13 @@ struct JournalRange {
 class TransactWriter {
  public:
   // `asIs` converts the account keys as the account import of the same load does.
-  TransactWriter(db::TableRecordset& rs, bool asIs);
+  TransactWriter(RowTarget& rs, bool asIs);
   void Add(int32_t fileId, int32_t transId, std::string_view keyField);
 
  private:
   static constexpr size_t kKeysPerTransaction = 4;
 
-  db::TableRecordset& rs_;
+  RowTarget& rs_;
   int fileId_, transId_;
   TextColumn key_;
   bool asIs_;
@@ -155,18 +302,22 @@ void ImportTransactions(const HostRecordFile& file, const TransactLayout& layout
   ProgressReporter progress(ui, static_cast<double>(n));
   db::Database db = db::Database::Open(dbFile);
   db::TableRecordset rs = db.OpenTable("tTransact");
-  TransactWriter writer(rs, asIs);
-  for (int64_t i = 1; i <= n; ++i) {
-    std::string_view rec = RecordOf(file, i);
-    if (accept(rec) && filter.Pass(FieldOf(rec, layout.typeAt, layout.typeLen),
-                                   DateAt(rec, layout.dateAt), DateAt(rec, layout.valueDateAt))) {
-      for (size_t k = 0; k < 4; ++k) {
-        writer.Add(fileId, static_cast<int32_t>(i),
-                   FieldOf(rec, layout.keysAt + k * layout.keyLen, layout.keyLen));
+  ImportPipeline pipeline(progress);
+  TransactWriter writer(pipeline.Add(rs), asIs);
+  pipeline.Run([&] {
+    for (int64_t i = 1; i <= n; ++i) {
+      std::string_view rec = RecordOf(file, i);
+      if (accept(rec) && filter.Pass(FieldOf(rec, layout.typeAt, layout.typeLen),
+                                     DateAt(rec, layout.dateAt), DateAt(rec, layout.valueDateAt))) {
+        for (size_t k = 0; k < 4; ++k) {
+          writer.Add(fileId, static_cast<int32_t>(i),
+                     FieldOf(rec, layout.keysAt + k * layout.keyLen, layout.keyLen));
+        }
       }
+      if (i % 5 == 0) pipeline.Progress(static_cast<double>(i));
+      pipeline.RecordDone();
     }
-    if (i % 5 == 0) progress.Update(static_cast<double>(i));
-  }
+  });
   rs.Close();
   db.Close();
 }

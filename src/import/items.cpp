@@ -57,25 +57,31 @@ void ReadItem(const std::string& CompPath, const std::string& pDBFile, const Pan
     db::Database db = db::Database::Open(pDBFile);
     {
       ProgressReporter progress(ui, q);
-      db::TableRecordset rs = db.OpenTable("tItem");
+      db::TableRecordset table = db.OpenTable("tItem");
+      importing::ImportPipeline pipeline(progress);
+      importing::RowTarget& rs = pipeline.Add(table);
       importing::TextColumn itemKey(rs, "ItemKey");
-      for (int64_t n = 2; n <= last; ++n) {
-        std::string_view rec = importing::RecordOf(file, n);
-        std::string converted = ConvertForSort(TrimSpaces(FieldOf(rec, kKeyAt, kKeyLen)));
-        std::string_view key = TrimSpaces(converted);
-        std::string_view sort = FieldOf(rec, kSortAt, kSortLen);
-        const bool inRange = !(!fromSort.empty() && CompareCodes(sort, fromSort) < 0) &&
-                             !(!toSort.empty() && CompareCodes(sort, toSort) > 0) &&
-                             !(!fromKey.empty() && CompareCodes(key, fromKey) < 0) &&
-                             !(!toKey.empty() && CompareCodes(key, toKey) > 0);
-        if (inRange && !key.empty()) {
-          rs.AddNew();
-          itemKey.Set(rs, key);
-          importing::UpdatePassingDuplicates(rs);
+      std::string converted;  // reused from record to record
+      pipeline.Run([&] {
+        for (int64_t n = 2; n <= last; ++n) {
+          std::string_view rec = importing::RecordOf(file, n);
+          ConvertForSort(TrimSpaces(FieldOf(rec, kKeyAt, kKeyLen)), converted);
+          std::string_view key = TrimSpaces(converted);
+          std::string_view sort = FieldOf(rec, kSortAt, kSortLen);
+          const bool inRange = !(!fromSort.empty() && CompareCodes(sort, fromSort) < 0) &&
+                               !(!toSort.empty() && CompareCodes(sort, toSort) > 0) &&
+                               !(!fromKey.empty() && CompareCodes(key, fromKey) < 0) &&
+                               !(!toKey.empty() && CompareCodes(key, toKey) > 0);
+          if (inRange && !key.empty()) {
+            rs.AddNew();
+            itemKey.Set(rs, key);
+            rs.UpdatePassingDuplicates();
+          }
+          if (n % 5 == 0) pipeline.Progress(static_cast<double>(n));
+          pipeline.RecordDone();
         }
-        if (n % 5 == 0) progress.Update(static_cast<double>(n));
-      }
-      rs.Close();
+      });
+      table.Close();
     }
 
     db.Execute(kClearMarks);

@@ -55,7 +55,7 @@ std::optional<int32_t> RefBound(const std::string& typed) {
 
 class HeadWriter {
  public:
-  HeadWriter(db::TableRecordset& rs, bool asIs)
+  HeadWriter(importing::RowTarget& rs, bool asIs)
       : rs_(rs),
         asIs_(asIs),
         compId_(rs.FieldIndex("CompID")),
@@ -125,7 +125,7 @@ class HeadWriter {
   }
 
  private:
-  db::TableRecordset& rs_;
+  importing::RowTarget& rs_;
   bool asIs_;
   int compId_, fileId_, headIndx_, docType_, refDate_, dueDate_, reference_, include_;
   TextColumn account_, name_, address1_, address2_, details_, sortByName_, sortByCity_, sortByZip_;
@@ -134,7 +134,7 @@ class HeadWriter {
 
 class LineWriter {
  public:
-  explicit LineWriter(db::TableRecordset& rs)
+  explicit LineWriter(importing::RowTarget& rs)
       : rs_(rs),
         compId_(rs.FieldIndex("CompID")),
         fileId_(rs.FieldIndex("TavFileID")),
@@ -155,7 +155,7 @@ class LineWriter {
   }
 
  private:
-  db::TableRecordset& rs_;
+  importing::RowTarget& rs_;
   int compId_, fileId_, headIndx_, lineIndx_;
   TextColumn item_;
   std::string converted_;
@@ -194,51 +194,55 @@ int32_t ReadStock(int16_t pCompID, const std::string& pCompPath, const std::stri
     db::Database db = db::Database::Open(pDBFile);
     db::TableRecordset heads = db.OpenTable("tStockHead");
     db::TableRecordset lines = db.OpenTable("tStockLine");
-    HeadWriter headWriter(heads, pAsIs);
-    LineWriter lineWriter(lines);
+    importing::ImportPipeline pipeline(progress);
+    HeadWriter headWriter(pipeline.Add(heads), pAsIs);
+    LineWriter lineWriter(pipeline.Add(lines));
     int64_t lastWritten = 0;
 
     int64_t i = 1;
-    for (; i <= n; ++i) {
-      std::string_view head = importing::RecordOf(file, i);
-      if (ByteOf(head, kKindAt) == kHeaderKind && typeMatches(ByteOf(head, kTypeAt))) {
-        const int64_t h = i;
-        const unsigned char docType = ByteOf(head, kTypeAt);
-        const int lineCount = ByteOf(head, kLineCountAt);
+    pipeline.Run([&] {
+      for (; i <= n; ++i) {
+        std::string_view head = importing::RecordOf(file, i);
+        if (ByteOf(head, kKindAt) == kHeaderKind && typeMatches(ByteOf(head, kTypeAt))) {
+          const int64_t h = i;
+          const unsigned char docType = ByteOf(head, kTypeAt);
+          const int lineCount = ByteOf(head, kLineCountAt);
 
-        ++i;
-        std::string_view second = importing::RecordOf(file, i);
-        const Date refDate = importing::DateAt(second, kDocDateAt);
-        const int32_t reference =
-            importing::LongAtStart(TrimSpaces(FieldOf(head, kRefAt, kRefLen)), "מספר מסמך");
+          ++i;
+          std::string_view second = importing::RecordOf(file, i);
+          const Date refDate = importing::DateAt(second, kDocDateAt);
+          const int32_t reference =
+              importing::LongAtStart(TrimSpaces(FieldOf(head, kRefAt, kRefLen)), "מספר מסמך");
 
-        // An excluded document's lines are not skipped: the loop visits them as records.
-        const bool included = !(fromDate && refDate < *fromDate) &&
-                              !(toDate && refDate > *toDate) &&
-                              !(fromRef && reference < *fromRef) && !(toRef && reference > *toRef);
-        if (included) {
-          const Date dueDate = importing::DateAt(second, kDueDateAt);
-          for (int j = 1; j <= lineCount; ++j) {
-            ++i;
-            std::string_view line = importing::RecordOf(file, i);
-            std::string_view item = TrimSpaces(FieldOf(line, kItemAt, kItemLen));
-            if (item.empty() || item == "#" || item == "*") continue;
-            if (ByteOf(line, kLineTypeAt) != docType) continue;
-            // The header is written once, with its first accepted line.
-            if (h > lastWritten) {
-              headWriter.Write(head, pCompID, row.FileIndex, static_cast<int32_t>(h), refDate,
-                               dueDate, reference);
-              lastWritten = h;
-            }
-            if (pWithLines) {
-              lineWriter.Write(pCompID, row.FileIndex, static_cast<int32_t>(h),
-                               static_cast<int32_t>(i), item);
+          // An excluded document's lines are not skipped: the loop visits them as records.
+          const bool included =
+              !(fromDate && refDate < *fromDate) && !(toDate && refDate > *toDate) &&
+              !(fromRef && reference < *fromRef) && !(toRef && reference > *toRef);
+          if (included) {
+            const Date dueDate = importing::DateAt(second, kDueDateAt);
+            for (int j = 1; j <= lineCount; ++j) {
+              ++i;
+              std::string_view line = importing::RecordOf(file, i);
+              std::string_view item = TrimSpaces(FieldOf(line, kItemAt, kItemLen));
+              if (item.empty() || item == "#" || item == "*") continue;
+              if (ByteOf(line, kLineTypeAt) != docType) continue;
+              // The header is written once, with its first accepted line.
+              if (h > lastWritten) {
+                headWriter.Write(head, pCompID, row.FileIndex, static_cast<int32_t>(h), refDate,
+                                 dueDate, reference);
+                lastWritten = h;
+              }
+              if (pWithLines) {
+                lineWriter.Write(pCompID, row.FileIndex, static_cast<int32_t>(h),
+                                 static_cast<int32_t>(i), item);
+              }
             }
           }
         }
+        if (i % 5 == 0) pipeline.Progress(static_cast<double>(i));
+        pipeline.RecordDone();
       }
-      if (i % 5 == 0) progress.Update(static_cast<double>(i));
-    }
+    });
     heads.Close();
     lines.Close();
     db.Close();
