@@ -88,7 +88,7 @@ for size in $sizes; do
   for cmd in labels list post; do
     best=""
     for ((r = 1; r <= runs; r++)); do
-      rm -f "$settings" "$temp"/zdr*
+      rm -f "$temp"/zdr* && : >"$settings"
       log="$dir/$cmd.log"
       if ! Temp="$temp" /usr/bin/time -f '%e %U %S %M' -o "$dir/time" "$zdrlab" "$cmd" \
           --company "$dir/company" --settings "$settings" "${wide[@]}" \

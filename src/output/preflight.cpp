@@ -250,14 +250,13 @@ PreflightResult RunPreflight(const std::string& pDBFile, int16_t pFileFormat, co
   const bool zipCarried = !AddressFromDocumentHeader(panel, docTypes);
 
   db::Database database = db::Database::Open(pDBFile);
-  db::Snapshot rs = database.OpenSnapshot(BuildRecipientsStatement(panel, docTypes, selectDbPath));
+  db::Snapshot rs = database.OpenSnapshot(BuildRecipientsStatement(panel, docTypes, selectDbPath),
+                                          db::SnapshotKind::Forward);
   if (rs.AtStart() || rs.AtEnd()) return result;
-  rs.MoveLast();
-  const int64_t count = rs.RecordCount();
+  const int64_t count = rs.TotalRows();
   const RowFields fields(rs);
   Checker checker(pFileFormat, zipCarried, count, result);
   ProgressReporter progress(ui, static_cast<double>(count));
-  rs.MoveFirst();
   while (!rs.AtEnd()) {
     ++result.rows;
     checker.Check(rs, fields, result.rows + 1);  // the header is row 1
