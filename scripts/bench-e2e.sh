@@ -23,6 +23,9 @@ runs="${ZDR_E2E_RUNS:-3}"
 sums="$here/bench/e2e_checksums.txt"
 zdrlab="$build/src/zdrlab"
 loaded="קריאת הנתונים הסתיימה"
+# A build from before --times existed is measured whole; its load and output are not split.
+times=()
+if "$zdrlab" --help 2>&1 | grep -q -- --times; then times=(--times); fi
 
 company() {  # company SIZE: generates the company once, prints its folder
   local dir="$root/zdr_bench_e2e_$1"
@@ -92,7 +95,7 @@ for size in $sizes; do
       log="$dir/$cmd.log"
       if ! Temp="$temp" /usr/bin/time -f '%e %U %S %M' -o "$dir/time" "$zdrlab" "$cmd" \
           --company "$dir/company" --settings "$settings" "${wide[@]}" \
-          --set FilePath="$temp/post.xlsx" --set OpenExcel=0 --times >/dev/null 2>"$log"; then
+          --set FilePath="$temp/post.xlsx" --set OpenExcel=0 "${times[@]}" >/dev/null 2>"$log"; then
         echo "zdrlab $cmd failed on the $size company:" >&2
         grep -v '^times' "$log" | tail -5 >&2
         exit 1
@@ -100,8 +103,10 @@ for size in $sizes; do
       read -r wall user sys rss <"$dir/time"
       load=$(awk -F'\t' -v s="$loaded" '$1 == "times" && $4 == s { print $2 }' "$log")
       load_cpu=$(awk -F'\t' -v s="$loaded" '$1 == "times" && $4 == s { print $3 }' "$log")
+      load=${load:-nan} load_cpu=${load_cpu:-nan}
       line=$(awk -v w="$wall" -v u="$user" -v s="$sys" -v m="$rss" -v l="$load" -v lc="$load_cpu" \
-        'BEGIN { printf "%.2f %.2f %.0f %.2f %.2f %.2f %.2f", w, u + s, m / 1024, l, lc, w - l, u + s - lc }')
+        'BEGIN { printf "%.2f %.2f %.0f ", w, u + s, m / 1024
+                 if (l == "nan") printf "- - - -"; else printf "%.2f %.2f %.2f %.2f", l, lc, w - l, u + s - lc }')
       # The run with the least wall time.
       if [ -z "$best" ] || awk -v a="$line" -v b="$best" 'BEGIN { split(a, x, " "); split(b, y, " "); exit !(x[1] < y[1]) }'; then
         best="$line"
@@ -139,8 +144,11 @@ for size in $sizes; do
   for cmd in labels list post; do
     read -r wall cpu rss load lcpu out ocpu <<<"${result[$size,$cmd]}"
     ratio="-"
-    [ -n "$fl" ] && ratio=$(awk -v l="$load" -v f="$fl" 'BEGIN { printf "%.2f", l / f }')
-    share=$(awk -v o="$out" -v l="$load" 'BEGIN { printf "%.1f%%", 100 * o / l }')
+    share="-"
+    if [ "$load" != - ]; then
+      [ -n "$fl" ] && ratio=$(awk -v l="$load" -v f="$fl" 'BEGIN { printf "%.2f", l / f }')
+      share=$(awk -v o="$out" -v l="$load" 'BEGIN { printf "%.1f%%", 100 * o / l }')
+    fi
     printf '%-6s %-7s %8s %8s %8s %8s %8s %8s %8s %9s %9s\n' "$size" "$cmd" "$wall" "$cpu" "$rss" \
       "$load" "$lcpu" "$out" "$ocpu" "$ratio" "$share"
   done
