@@ -640,13 +640,10 @@ void CreateLabPdf(const std::string& pFileName, const std::string& pDBFile, cons
 
   ProgressReporter progress(ui, 1);
   db::Database database = db::Database::Open(pDBFile);
-  db::Snapshot rs = database.OpenSnapshot(BuildRecipientsStatement(panel, docTypes, selectDbPath));
-  int64_t count = 0;
-  if (!rs.AtStart() && !rs.AtEnd()) {
-    rs.MoveLast();
-    count = rs.RecordCount();
-    rs.MoveFirst();
-  }
+  // The rows are read as the pages are drawn; their number is known when the snapshot opens.
+  db::Snapshot rs = database.OpenSnapshot(BuildRecipientsStatement(panel, docTypes, selectDbPath),
+                                          db::SnapshotKind::Forward);
+  const int64_t count = rs.TotalRows();
   const int64_t start = std::max<int64_t>(g.start, 1);
   const int64_t total = count == 0 ? 0 : g.copies * (start + count - 1);
   const int64_t pages = (total + perPage - 1) / perPage;
