@@ -15,6 +15,7 @@
 #include <vector>
 
 #include "import/codepage.h"
+#include "support/scratchtemp.h"
 #include "workdb/worklock.h"
 #include "zdrgen/generator.h"
 
@@ -44,8 +45,8 @@ std::string ReadFile(const fs::path& p) {
 class CliTest : public ::testing::Test {
  protected:
   static void SetUpTestSuite() {
-    root_ = fs::temp_directory_path() / ("zdr-cli-" + std::to_string(::getpid()));
-    fs::remove_all(root_);
+    scratch_ = new zdr::test::ScratchTemp;
+    root_ = scratch_->dir();
     zdrgen::Options options;
     options.seed = 11;
     options.accounts = 60;
@@ -55,7 +56,7 @@ class CliTest : public ::testing::Test {
   }
   static void TearDownTestSuite() {
     delete truth_;
-    fs::remove_all(root_);
+    delete scratch_;
   }
 
   void SetUp() override {
@@ -116,12 +117,14 @@ class CliTest : public ::testing::Test {
     return {command, "--company", (root_ / "company").string(), "--settings", settings_.string()};
   }
 
+  static zdr::test::ScratchTemp* scratch_;
   static fs::path root_;
   static zdrgen::CompanyTruth* truth_;
   fs::path temp_;
   fs::path settings_;
 };
 
+zdr::test::ScratchTemp* CliTest::scratch_ = nullptr;
 fs::path CliTest::root_;
 zdrgen::CompanyTruth* CliTest::truth_ = nullptr;
 

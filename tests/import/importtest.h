@@ -5,7 +5,6 @@
 #include <gtest/gtest.h>
 #include <stdlib.h>
 
-#include <atomic>
 #include <filesystem>
 #include <fstream>
 #include <string>
@@ -15,14 +14,12 @@
 #include "control/userseam.h"
 #include "import/codepage.h"
 #include "support/recordingseam.h"
+#include "support/scratchtemp.h"
 #include "workdb/engine.h"
 #include "workdb/schema.h"
 #include "zdrgen/generator.h"
 
-namespace zdr::importtest {
-
-using test::RecordingSeam;
-using test::ShownMessage;
+namespace zdr::test {
 
 // Records messages, status lines and progress; answers every question with Yes.
 
@@ -30,18 +27,9 @@ using test::ShownMessage;
 class ImportTest : public ::testing::Test {
  protected:
   void SetUp() override {
-    static std::atomic<int> counter{0};
-    root_ = std::filesystem::temp_directory_path() /
-            ("zdr_import_test_" + std::to_string(::getpid()) + "_" + std::to_string(counter++));
-    std::filesystem::remove_all(root_);
-    std::filesystem::create_directories(root_ / "temp");
+    root_ = scratch_.dir();
     std::filesystem::create_directories(root_ / "company");
-    ::setenv("Temp", (root_ / "temp").c_str(), 1);
     company_ = (root_ / "company").string();
-  }
-  void TearDown() override {
-    std::error_code ec;
-    std::filesystem::remove_all(root_, ec);
   }
 
   // A new, empty working database; fails the test when it cannot be created.
@@ -94,6 +82,7 @@ class ImportTest : public ::testing::Test {
     return rows.empty() ? -1 : std::stoll(rows[0]);
   }
 
+  ScratchTemp scratch_;
   std::filesystem::path root_;
   std::string company_;
   RecordingSeam seam_;
@@ -104,4 +93,4 @@ inline std::string HostText(std::string_view utf8, size_t width) {
   return zdrgen::HostField(utf8, width);
 }
 
-}  // namespace zdr::importtest
+}  // namespace zdr::test

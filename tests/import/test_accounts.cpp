@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <functional>
 #include <string>
 #include <vector>
 
@@ -15,7 +16,7 @@
 namespace zdr {
 namespace {
 
-using importtest::ImportTest;
+using test::ImportTest;
 
 zdrgen::AccountFields Acc(std::string key, uint8_t agent = 0, std::string sortCode = "   ",
                           std::string cutOff = "    ") {
@@ -24,7 +25,7 @@ zdrgen::AccountFields Acc(std::string key, uint8_t agent = 0, std::string sortCo
   f.agent = agent;
   f.sortCode = std::move(sortCode);
   f.cutOff = std::move(cutOff);
-  f.name = importtest::HostText("לקוח", 30);
+  f.name = test::HostText("לקוח", 30);
   return f;
 }
 
@@ -95,27 +96,6 @@ TEST_F(AccountImport, BlankKeyRecordIsSkippedAndImportGoesOn) {
 
 // ---- Criteria.
 
-TEST_F(AccountImport, AgentFromBoundOnly) {
-  WriteAccounts({Acc("1", 0), Acc("2", 2), Acc("3", 3), Acc("4", 255)});
-  panel_.ChkAgent = 1;
-  panel_.txtAgent = "3";
-  EXPECT_TRUE(Run());
-  EXPECT_EQ(Keys(), (Strings{"3", "4"}));
-}
-
-TEST_F(AccountImport, AgentBothBoundsInclusiveAndBoxOffIgnoresThem) {
-  WriteAccounts({Acc("1", 1), Acc("2", 2), Acc("3", 3), Acc("4", 4)});
-  panel_.txtAgent = "2";
-  panel_.txtToAgent = "3";
-  panel_.ChkAgent = 2;  // greyed counts as off
-  EXPECT_TRUE(Run());
-  EXPECT_EQ(Count(db_, "tAccount"), 4);
-  db_.clear();
-  panel_.ChkAgent = 1;
-  EXPECT_TRUE(Run());
-  EXPECT_EQ(Keys(), (Strings{"2", "3"}));
-}
-
 TEST_F(AccountImport, AgentBoundOfLettersEndsImportWithFault) {
   WriteAccounts({Acc("1", 1)});
   panel_.ChkAgent = 1;
@@ -135,26 +115,8 @@ TEST_F(AccountImport, AgentBoundAboveByteIsFault) {
   EXPECT_EQ(seam_.messages.size(), 1u);
 }
 
-TEST_F(AccountImport, NumericKeyRangeComparesNumbers) {
-  WriteAccounts({Acc("50"), Acc("100"), Acc("150"), Acc("1500"), Acc("200"), Acc("201")});
-  panel_.ChkAccKey = 1;
-  panel_.TxtFromCrd = "100";
-  panel_.TxtToCrd = "200";
-  EXPECT_TRUE(Run());
-  EXPECT_EQ(Keys(), (Strings{"100", "150", "200"}));
-}
-
-TEST_F(AccountImport, OneEmptyKeyBoundComparesText) {
-  WriteAccounts({Acc("50"), Acc("100"), Acc("1500"), Acc("099")});
-  panel_.ChkAccKey = 1;
-  panel_.TxtFromCrd = "100";
-  EXPECT_TRUE(Run());
-  // As text 1500 and 50 are not less than 100; 099 is.
-  EXPECT_EQ(Keys(), (Strings{"50", "100", "1500"}));
-}
-
 TEST_F(AccountImport, TextKeyRangeWithLettersAndHebrew) {
-  WriteAccounts({Acc("A1"), Acc("B2"), Acc("C3"), Acc(importtest::HostText("אב", 8))});
+  WriteAccounts({Acc("A1"), Acc("B2"), Acc("C3"), Acc(test::HostText("אב", 8))});
   panel_.ChkAccKey = 1;
   panel_.TxtFromCrd = "B";
   panel_.TxtToCrd = "ת";
@@ -164,24 +126,72 @@ TEST_F(AccountImport, TextKeyRangeWithLettersAndHebrew) {
   EXPECT_EQ(keys, (Strings{"B2", "C3", "אב"}));
 }
 
-TEST_F(AccountImport, SortCodeBoundIsPaddedToThree) {
-  WriteAccounts({Acc("1", 0, "  3"), Acc("2", 0, "  5"), Acc("3", 0, "  7"), Acc("4", 0, " 10")});
-  panel_.ChkCatCode = 1;
-  panel_.txtFromSort = "5";
-  EXPECT_TRUE(Run());
-  // Padded, the bound keeps "  3" out; " 10" is above "  5" as text.
-  EXPECT_EQ(Keys(), (Strings{"2", "3", "4"}));
-  db_.clear();
-  panel_.txtToSort = "5";
-  EXPECT_TRUE(Run());
-  EXPECT_EQ(Keys(), (Strings{"2"}));
-}
-
-TEST_F(AccountImport, CutOffAllStarsSkipsNothing) {
-  WriteAccounts({Acc("1", 0, "   ", "ABCD"), Acc("2", 0, "   ", "    ")});
-  panel_.chkCutOff = 1;
-  EXPECT_TRUE(Run());
-  EXPECT_EQ(Count(db_, "tAccount"), 2);
+// Each row sets some of the account criteria on a fresh panel and names the keys that pass.
+TEST_F(AccountImport, CriteriaBoundsAreInclusive) {
+  using Acc4 = std::vector<zdrgen::AccountFields>;
+  const Acc4 agents = {Acc("1", 0), Acc("2", 2), Acc("3", 3), Acc("4", 255)};
+  const Acc4 numbers = {Acc("50"), Acc("100"), Acc("150"), Acc("1500"), Acc("200"), Acc("201")};
+  const Acc4 sorts = {Acc("1", 0, "  3"), Acc("2", 0, "  5"), Acc("3", 0, "  7"),
+                      Acc("4", 0, " 10")};
+  const Acc4 mixed = {Acc("10", 5, "  5", "A   "), Acc("20", 5, "  5", "B   "),
+                      Acc("30", 1, "  5", "A   "), Acc("40", 5, "  9", "A   "),
+                      Acc("50", 5, "  5", "A   "), Acc("60", 5, "  5", "ABCD")};
+  struct Case {
+    const char* what;
+    const Acc4& accounts;
+    std::function<void(Panel&)> set;
+    Strings keys;
+  };
+  const Case cases[] = {
+      {"agent from only", agents, [](Panel& p) { p.ChkAgent = 1, p.txtAgent = "3"; }, {"3", "4"}},
+      {"agent both",
+       agents,
+       [](Panel& p) { p.ChkAgent = 1, p.txtAgent = "2", p.txtToAgent = "3"; },
+       {"2", "3"}},
+      {"agent greyed is off",
+       agents,
+       [](Panel& p) { p.ChkAgent = 2, p.txtAgent = "2", p.txtToAgent = "3"; },
+       {"1", "2", "3", "4"}},
+      {"numeric keys",
+       numbers,
+       [](Panel& p) { p.ChkAccKey = 1, p.TxtFromCrd = "100", p.TxtToCrd = "200"; },
+       {"100", "150", "200"}},
+      // One bound empty: compared as text, where 1500 and 50 are not below 100.
+      {"text keys",
+       numbers,
+       [](Panel& p) { p.ChkAccKey = 1, p.TxtFromCrd = "100"; },
+       {"50", "100", "150", "200", "201", "1500"}},
+      // A short sort bound is padded to "  5", which keeps "  3" out and lets " 10" in.
+      {"sort from",
+       sorts,
+       [](Panel& p) { p.ChkCatCode = 1, p.txtFromSort = "5"; },
+       {"2", "3", "4"}},
+      {"sort both",
+       sorts,
+       [](Panel& p) { p.ChkCatCode = 1, p.txtFromSort = "5", p.txtToSort = "5"; },
+       {"2"}},
+      {"cut-off all stars",
+       mixed,
+       [](Panel& p) { p.chkCutOff = 1; },
+       {"10", "20", "30", "40", "50", "60"}},
+      {"all together",
+       mixed,
+       [](Panel& p) {
+         p.ChkAgent = 1, p.txtAgent = "2", p.ChkAccKey = 1, p.TxtFromCrd = "10";
+         p.TxtToCrd = "50", p.ChkCatCode = 1, p.txtFromSort = "5", p.txtToSort = "5";
+         p.chkCutOff = 1, p.CutOff[1] = "A";
+       },
+       {"10", "50"}},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(c.what);
+    WriteAccounts(c.accounts);
+    panel_ = Panel{};
+    c.set(panel_);
+    db_.clear();
+    EXPECT_TRUE(Run());
+    EXPECT_EQ(Keys(), c.keys);
+  }
 }
 
 TEST_F(AccountImport, EmptyCutOffBoxBecomesSpaceAndMatchesSpace) {
@@ -211,35 +221,17 @@ TEST_F(AccountImport, CutOffBoxOffLeavesEmptyBoxAlone) {
   EXPECT_EQ(panel_.CutOff[3], "");
 }
 
-TEST_F(AccountImport, AllCriteriaTogether) {
-  WriteAccounts({Acc("10", 5, "  5", "A   "), Acc("20", 5, "  5", "B   "),
-                 Acc("30", 1, "  5", "A   "), Acc("40", 5, "  9", "A   "),
-                 Acc("50", 5, "  5", "A   "), Acc("60", 5, "  5", "A   ")});
-  panel_.ChkAgent = 1;
-  panel_.txtAgent = "2";
-  panel_.ChkAccKey = 1;
-  panel_.TxtFromCrd = "10";
-  panel_.TxtToCrd = "50";
-  panel_.ChkCatCode = 1;
-  panel_.txtFromSort = "5";
-  panel_.txtToSort = "5";
-  panel_.chkCutOff = 1;
-  panel_.CutOff[1] = "A";
-  EXPECT_TRUE(Run());
-  EXPECT_EQ(Keys(), (Strings{"10", "50"}));
-}
-
 // ---- Values written.
 
 TEST_F(AccountImport, FullRowValues) {
   zdrgen::AccountFields f = Acc("123", 7, "  5", "ABCD");
-  f.name = importtest::HostText("משה כהן", 30);
-  f.address = importtest::HostText("הרצל 12", 30);
-  f.city = importtest::HostText("חיפה", 15);
+  f.name = test::HostText("משה כהן", 30);
+  f.address = test::HostText("הרצל 12", 30);
+  f.city = test::HostText("חיפה", 15);
   f.zip = "34567";
-  f.district = importtest::HostText("צפון", 15);
+  f.district = test::HostText("צפון", 15);
   f.telephone = "04-1234567";
-  f.details = importtest::HostText("דוד לוי", 50);
+  f.details = test::HostText("דוד לוי", 50);
   WriteAccounts({f});
   EXPECT_TRUE(Run());
   EXPECT_EQ(Rows(db_,
@@ -281,9 +273,9 @@ TEST_F(AccountImport, AsIsChangesOnlyTheKey) {
 
 TEST_F(AccountImport, DuplicateKeyOrSortKeyKeepsTheFirst) {
   zdrgen::AccountFields a = Acc("5");
-  a.city = importtest::HostText("עכו", 15);
+  a.city = test::HostText("עכו", 15);
   zdrgen::AccountFields b = Acc("5");
-  b.city = importtest::HostText("לוד", 15);
+  b.city = test::HostText("לוד", 15);
   // "-א1" and ".א1" show as different keys but share the sort key "1 א ".
   WriteAccounts({a, b,
                  Acc("-\x80"

@@ -21,7 +21,7 @@
 namespace zdr {
 namespace {
 
-using importtest::ImportTest;
+using test::ImportTest;
 using Strings = std::vector<std::string>;
 using zdrgen::HostDate;
 
@@ -283,7 +283,7 @@ TEST_F(DataLoad, DispatchLoadLostPayersWhoseKeysConvertDifferently) {
               Strings{});
 
     // The courier layout starts each line with the account key.
-    const std::string csv = (root_ / "temp" / "zdpost1.csv").string();
+    const std::string csv = (root_ / "zdpost1.csv").string();
     CreateCSV(csv, state_.workDbPath, 1, panel_, docTypes_, "", PostILSettings(), seam_);
     std::ifstream in(csv, std::ios::binary);
     const std::string text = Win1255ToUtf8(std::string(std::istreambuf_iterator<char>(in), {}));

@@ -16,7 +16,7 @@
 namespace zdr {
 namespace {
 
-using importtest::ImportTest;
+using test::ImportTest;
 using Strings = std::vector<std::string>;
 using zdrgen::HostDate;
 
@@ -35,7 +35,7 @@ std::vector<std::string> Doc(int type, std::vector<Line> lines, std::string ref 
   h.type = static_cast<uint8_t>(type);
   h.accountKey = std::move(key);
   h.reference = std::move(ref);
-  h.name = importtest::HostText("לקוח", 30);
+  h.name = test::HostText("לקוח", 30);
   h.lineCount = static_cast<uint8_t>(lines.size());
   std::vector<std::string> recs{zdrgen::DocHeaderRecord(h),
                                 zdrgen::DocSecondHeaderRecord(date, HostDate::Of(2020, 7, 1))};
@@ -72,11 +72,11 @@ TEST_F(DocumentImport, HeaderAndLineValues) {
   zdrgen::DocHeaderFields h;
   h.type = 1;
   h.accountKey = "AB(1";
-  h.name = importtest::HostText("משה כהן", 30);
-  h.address1 = importtest::HostText("הרצל 5", 30);
-  h.address2 = importtest::HostText("חיפה", 30);
+  h.name = test::HostText("משה כהן", 30);
+  h.address1 = test::HostText("הרצל 5", 30);
+  h.address2 = test::HostText("חיפה", 30);
   h.reference = "00042";
-  h.details = importtest::HostText("לכבוד", 48);
+  h.details = test::HostText("לכבוד", 48);
   h.lineCount = 1;
   zdrgen::DocLineFields l;
   l.itemKey = "X-1";

@@ -10,6 +10,8 @@
 #include <limits>
 #include <string>
 
+#include "support/scratchtemp.h"
+
 namespace zdr {
 namespace {
 
@@ -17,15 +19,6 @@ namespace fs = std::filesystem;
 
 class HostFileTest : public ::testing::Test {
  protected:
-  void SetUp() override {
-    dir_ = fs::temp_directory_path() /
-           ("zdr_hostfile_" + std::to_string(::getpid()) + "_" +
-            ::testing::UnitTest::GetInstance()->current_test_info()->name());
-    fs::remove_all(dir_);
-    fs::create_directories(dir_);
-  }
-  void TearDown() override { fs::remove_all(dir_); }
-
   fs::path Write(const std::string& name, const std::string& bytes) {
     fs::path p = dir_ / name;
     std::ofstream(p, std::ios::binary) << bytes;
@@ -45,7 +38,8 @@ class HostFileTest : public ::testing::Test {
     return out;
   }
 
-  fs::path dir_;
+  test::ScratchTemp scratch_;
+  const fs::path dir_ = scratch_.dir();
 };
 
 TEST_F(HostFileTest, EmptyFileHasNoRecords) {

@@ -21,13 +21,12 @@
 #include "output/output.h"
 #include "output/outputdefs.h"
 #include "support/recordingseam.h"
+#include "support/scratchtemp.h"
 #include "workdb/schema.h"
 
 #include "workdb/engine.h"
 
-namespace zdr::testing {
-
-using test::RecordingSeam;
+namespace zdr::test {
 
 using Text = std::optional<std::string>;
 
@@ -89,16 +88,9 @@ inline std::string Python() {
 class OutputTest : public ::testing::Test {
  protected:
   void SetUp() override {
-    std::string pattern = (std::filesystem::temp_directory_path() / "zdrout.XXXXXX").string();
-    ASSERT_NE(mkdtemp(pattern.data()), nullptr);
-    dir_ = pattern;
-    setenv("Temp", dir_.c_str(), 1);
+    dir_ = scratch_.dir();
     panel.CmbSortBy = 0;  // by sort key: the order rows were added in
     panel.CmbSortDir = 0;
-  }
-  void TearDown() override {
-    std::error_code ec;
-    std::filesystem::remove_all(dir_, ec);
   }
 
   // A new working database holding `accounts` (sorted in the given order) and `heads`.
@@ -176,6 +168,7 @@ class OutputTest : public ::testing::Test {
   std::string PathOf(const std::string& name) const { return (dir_ / name).string(); }
   std::string Utf8File(const std::string& path) const { return Win1255ToUtf8(ReadBytes(path)); }
 
+  test::ScratchTemp scratch_;
   std::filesystem::path dir_;
   Panel panel;
   DocTypeTable docTypes;
@@ -184,4 +177,4 @@ class OutputTest : public ::testing::Test {
   RecordingSeam seam;
 };
 
-}  // namespace zdr::testing
+}  // namespace zdr::test

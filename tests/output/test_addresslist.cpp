@@ -3,7 +3,7 @@
 
 #include "output/outputtest.h"
 
-namespace zdr::testing {
+namespace zdr::test {
 namespace {
 
 std::vector<std::string> ListHead(const std::string& date) {
@@ -98,14 +98,6 @@ TEST_F(AddressListTest, PagesNeededRoundUp) {
   EXPECT_NE(Write(NumberedAccounts(3)).find(Totals(3, 0)), std::string::npos);
 }
 
-TEST_F(AddressListTest, ProgressStartsAndEndsAtZero) {
-  Write(NumberedAccounts(12));
-  ASSERT_GE(seam.progress.size(), 3u);
-  EXPECT_EQ(seam.progress.front(), 0);
-  EXPECT_EQ(seam.progress.back(), 0);
-  EXPECT_NE(std::find(seam.progress.begin(), seam.progress.end(), 1250), seam.progress.end());
-}
-
 TEST_F(AddressListTest, BadGeometryFailsWithoutHalfAList) {
   const std::string out = PathOf("zdrlab2.htm");
   const std::string db = BuildDb(NumberedAccounts(3));
@@ -169,4 +161,4 @@ TEST_F(AddressListTest, WideCountGivesCompleteList) {
 }
 
 }  // namespace
-}  // namespace zdr::testing
+}  // namespace zdr::test

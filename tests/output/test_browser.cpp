@@ -10,7 +10,7 @@
 
 #include "output/outputtest.h"
 
-namespace zdr::testing {
+namespace zdr::test {
 namespace {
 
 constexpr const char* kChromium = "/usr/bin/chromium";
@@ -162,4 +162,4 @@ TEST_F(BrowserTest, SheetsAfterTheFirstShrankOntoSharedPages) {
 }
 
 }  // namespace
-}  // namespace zdr::testing
+}  // namespace zdr::test

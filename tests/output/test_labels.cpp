@@ -6,7 +6,7 @@
 
 #include "output/outputtest.h"
 
-namespace zdr::testing {
+namespace zdr::test {
 namespace {
 
 const std::string kCellEmpty = "    <tr><td nowrap>&nbsp;</td></tr>";
@@ -203,34 +203,41 @@ TEST_F(LabelSheetTest, TwentyFiveOnEightByThreeGivesTwoPages) {
   EXPECT_TRUE(sheet.ends_with("</table>\r\n</BODY>\r\n</HTML>\r\n"));
 }
 
-TEST_F(LabelSheetTest, StartFiveLeavesFirstFourCellsEmpty) {
+// Start-1 empty cells, then `copies` adjacent cells per recipient in order, then empty
+// cells to the end of the last page; a start below one counts as one.
+TEST_F(LabelSheetTest, StartAndCopiesPlaceEveryRecipient) {
   NameOnly();
-  panel.txtStartFrom = "5";
-  const auto pages = Pages(Write(NumberedAccounts(25)));
-  ASSERT_EQ(pages.size(), 2u);  // 5 + 25 - 1 = 29 cells
-  const auto first = Cells(pages[0]), second = Cells(pages[1]);
-  for (size_t i = 0; i < 4; ++i) EXPECT_TRUE(IsEmptyCell(first[i])) << i;
-  EXPECT_NE(first[4].find("<td>לקוח 1</td>"), std::string::npos);    // row 2, column 2
-  EXPECT_NE(second[0].find("<td>לקוח 21</td>"), std::string::npos);  // later pages from 1
-  EXPECT_NE(second[4].find("<td>לקוח 25</td>"), std::string::npos);
-  EXPECT_TRUE(IsEmptyCell(second[5]));
-}
-
-TEST_F(LabelSheetTest, CopiesFillAdjacentCells) {
-  NameOnly();
-  panel.txtCopies = "2";
-  panel.txtStartFrom = "5";
-  const auto pages = Pages(Write(NumberedAccounts(25)));
-  ASSERT_EQ(pages.size(), 3u);  // 2 x (5 + 25 - 1) = 58 cells
-  std::vector<std::string> cells;
-  for (const auto& p : pages)
-    for (const auto& c : Cells(p)) cells.push_back(c);
-  EXPECT_TRUE(IsEmptyCell(cells[3]));
-  EXPECT_NE(cells[4].find("<td>לקוח 1</td>"), std::string::npos);
-  EXPECT_NE(cells[5].find("<td>לקוח 1</td>"), std::string::npos);
-  EXPECT_NE(cells[6].find("<td>לקוח 2</td>"), std::string::npos);
-  EXPECT_NE(cells[53].find("<td>לקוח 25</td>"), std::string::npos);
-  for (size_t i = 54; i < cells.size(); ++i) EXPECT_TRUE(IsEmptyCell(cells[i])) << i;
+  struct Case {
+    const char *rows, *cols, *start, *copies;
+    int count;
+    size_t skipped, perRecipient, pages;
+  };
+  const Case cases[] = {
+      {"8", "3", "5", "1", 25, 4, 1, 2}, {"8", "3", "5", "2", 25, 4, 2, 3},
+      {"8", "3", "1", "0", 3, 0, 0, 0},  {"2", "2", "0", "1", 4, 0, 1, 1},
+      {"2", "2", "-3", "1", 4, 0, 1, 1},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(std::string("start ") + c.start + ", copies " + c.copies);
+    panel.txtRows = c.rows;
+    panel.txtCols = c.cols;
+    panel.txtStartFrom = c.start;
+    panel.txtCopies = c.copies;
+    const auto pages = Pages(Write(NumberedAccounts(c.count)));
+    ASSERT_EQ(pages.size(), c.pages);
+    std::vector<std::string> cells;
+    for (const auto& p : pages)
+      for (const auto& cell : Cells(p)) cells.push_back(cell);
+    for (size_t i = 0; i < cells.size(); ++i) {
+      const size_t k = i - c.skipped;
+      if (i < c.skipped || k >= c.count * c.perRecipient) {
+        EXPECT_TRUE(IsEmptyCell(cells[i])) << i;
+      } else {
+        const std::string name = "<td>לקוח " + std::to_string(k / c.perRecipient + 1) + "</td>";
+        EXPECT_NE(cells[i].find(name), std::string::npos) << i;
+      }
+    }
+  }
 }
 
 TEST_F(LabelSheetTest, StartBeyondSheetLeavesFirstPageEmpty) {
@@ -240,14 +247,6 @@ TEST_F(LabelSheetTest, StartBeyondSheetLeavesFirstPageEmpty) {
   ASSERT_EQ(pages.size(), 2u);  // 30 + 3 - 1 = 32 cells
   for (const auto& c : Cells(pages[0])) EXPECT_TRUE(IsEmptyCell(c));
   EXPECT_NE(Cells(pages[1])[0].find("<td>לקוח 1</td>"), std::string::npos);
-}
-
-TEST_F(LabelSheetTest, CopiesZeroWritesNoPage) {
-  NameOnly();
-  panel.txtCopies = "0";
-  const std::string sheet = Write(NumberedAccounts(3));
-  EXPECT_TRUE(Pages(sheet).empty());
-  EXPECT_TRUE(sheet.ends_with("<BODY BGCOLOR='#FFFFFF'>\r\n</BODY>\r\n</HTML>\r\n"));
 }
 
 TEST_F(LabelSheetTest, CityAndZipSwitches) {
@@ -362,18 +361,6 @@ TEST_F(LabelSheetTest, PicturePathOutsideCodePageIsKept) {
   EXPECT_NE(ReadBytes(out).find("src='/img/&#1046;&#1091;&#1082;.png'"), std::string::npos);
 }
 
-TEST_F(LabelSheetTest, StartBelowOneLosesNoRecipient) {
-  NameOnly();
-  panel.txtRows = "2";
-  panel.txtCols = "2";
-  for (const char* start : {"0", "-3"}) {
-    panel.txtStartFrom = start;
-    const std::string sheet = Write(NumberedAccounts(4));
-    EXPECT_EQ(Pages(sheet).size(), 1u) << start;
-    EXPECT_EQ(Count(sheet, "<td>לקוח 4</td>"), 1u) << start;
-  }
-}
-
 TEST_F(LabelSheetTest, WideCountGivesCompleteSheet) {
   NameOnly();
   panel.txtRows = "10";
@@ -463,4 +450,4 @@ TEST(HtmlHelpers, SpreadInCells) {
 }
 
 }  // namespace
-}  // namespace zdr::testing
+}  // namespace zdr::test

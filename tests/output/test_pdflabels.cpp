@@ -13,7 +13,7 @@
 #include "output/outputtest.h"
 #include "output/pdflabels.h"
 
-namespace zdr::testing {
+namespace zdr::test {
 namespace {
 
 constexpr double kMm = 72.0 / 25.4;
@@ -300,4 +300,4 @@ TEST_F(PdfLabelsTest, CalibrationPageShowsTheStockAndItsScales) {
 }
 
 }  // namespace
-}  // namespace zdr::testing
+}  // namespace zdr::test

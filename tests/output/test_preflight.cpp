@@ -13,7 +13,7 @@
 #include "output/preflight.h"
 #include "zdrgen/generator.h"
 
-namespace zdr::testing {
+namespace zdr::test {
 namespace {
 
 // "row:rule" for every finding, in order.
@@ -260,10 +260,8 @@ TEST_F(FindingsSheetTest, FindingsSheetIsRightToLeftTextAndCanOpenFirst) {
 // The sample company: every fault the generator planted is found on its account.
 
 TEST(SampleCompanyPreflightTest, FindsThePlantedFaults) {
-  const std::filesystem::path root =
-      std::filesystem::temp_directory_path() / ("zdr-preflight-" + std::to_string(::getpid()));
-  std::filesystem::remove_all(root);
-  setenv("Temp", root.c_str(), 1);
+  test::ScratchTemp scratch;
+  const std::filesystem::path root = scratch.dir();
   zdrgen::Options options;
   options.seed = 7;
   const zdrgen::CompanyTruth truth = zdrgen::WriteCompany(root / "company", options, "חברה");
@@ -296,8 +294,7 @@ TEST(SampleCompanyPreflightTest, FindsThePlantedFaults) {
   EXPECT_EQ(duplicates, 1);
   EXPECT_TRUE(seam.messages.empty());
   EXPECT_EQ(seam.statuses.back(), "הבדיקה הסתיימה. " + PreflightCounts(control.lastPreflight()));
-  std::filesystem::remove_all(root);
 }
 
 }  // namespace
-}  // namespace zdr::testing
+}  // namespace zdr::test

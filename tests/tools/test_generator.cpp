@@ -16,6 +16,7 @@
 #include "import/doctypes.h"
 #include "import/hostfile.h"
 #include "import/hosttext.h"
+#include "support/scratchtemp.h"
 
 namespace zdrgen {
 namespace {
@@ -34,19 +35,9 @@ std::string W(std::string_view utf8) {
   return zdr::Utf8ToWin1255(utf8);
 }
 
-class TempDir {
- public:
-  explicit TempDir(const std::string& tag) {
-    const ::testing::TestInfo* test = ::testing::UnitTest::GetInstance()->current_test_info();
-    path_ = fs::temp_directory_path() / ("zdrgen_test_" + std::to_string(::getpid()) + "_" + tag +
-                                         (test ? std::string("_") + test->name() : ""));
-    fs::remove_all(path_);
-  }
-  ~TempDir() { fs::remove_all(path_); }
-  const fs::path& path() const { return path_; }
-
- private:
-  fs::path path_;
+// A scratch folder, removed with everything in it afterwards.
+struct TempDir : zdr::test::ScratchTemp {
+  const fs::path& path() const { return dir(); }
 };
 
 // ---------------------------------------------------------------------------------------
@@ -203,8 +194,7 @@ TEST(RecordBuilderTest, LedgerBatchAndCashRecords) {
 }
 
 TEST(RecordBuilderTest, WriteRecordsNamesTheFileItCannotWrite) {
-  TempDir dir("write");
-  fs::create_directories(dir.path());
+  TempDir dir;
   std::ofstream(dir.path() / "plain") << "x";
   try {
     WriteRecords(dir.path() / "plain" / "ACT.fix", {"abc"});
@@ -239,7 +229,7 @@ TEST(RandomTest, SameSeedSameSequenceAndBoundsHold) {
 class CompanyTest : public ::testing::Test {
  protected:
   static void SetUpTestSuite() {
-    dir_ = new TempDir("company");
+    dir_ = new TempDir;
     Options o;
     o.seed = 7;
     truth_ = new CompanyTruth(WriteCompany(dir_->path() / "c", o, "מסחר ותעשייה"));
@@ -480,7 +470,7 @@ TEST_F(CompanyTest, LedgerAndReceiptKeysMatchTheAccountsUnderTheReversal) {
 }
 
 TEST(GeneratorTest, SameSeedWritesTheSameBytes) {
-  TempDir dir("determinism");
+  TempDir dir;
   Options o;
   o.seed = 99;
   o.accounts = 60;
@@ -501,7 +491,7 @@ TEST(GeneratorTest, SameSeedWritesTheSameBytes) {
 }
 
 TEST(GeneratorTest, CompaniesForTheChooserWithOneBlankName) {
-  TempDir dir("companies");
+  TempDir dir;
   Options o;
   o.accounts = 5;
   o.documents = 5;
@@ -530,7 +520,7 @@ TEST(GeneratorTest, CompaniesForTheChooserWithOneBlankName) {
 }
 
 TEST(GeneratorTest, EmptySizesStillWriteEveryFile) {
-  TempDir dir("empty");
+  TempDir dir;
   Options o;
   o.accounts = 0;
   o.documents = 0;
