@@ -94,3 +94,8 @@ inline std::string HostText(std::string_view utf8, size_t width) {
 }
 
 }  // namespace zdr::test
+
+// The older name of these helpers, still used by the pipeline tests.
+namespace zdr {
+namespace importtest = test;
+}  // namespace zdr
