@@ -94,8 +94,3 @@ inline std::string HostText(std::string_view utf8, size_t width) {
 }
 
 }  // namespace zdr::test
-
-// The older name of these helpers, still used by the pipeline tests.
-namespace zdr {
-namespace importtest = test;
-}  // namespace zdr

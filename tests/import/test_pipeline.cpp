@@ -37,7 +37,7 @@ class ThreadRecordingSeam : public test::RecordingSeam {
   int callsFromAnotherThread = 0;
 };
 
-class Pipeline : public importtest::ImportTest {
+class Pipeline : public test::ImportTest {
  protected:
   void SetUp() override {
     ImportTest::SetUp();
