@@ -8,6 +8,17 @@
 #include "workdb/engine.h"
 
 namespace zdr {
+
+output_internal::LabelFields::LabelFields(const db::Snapshot& rs)
+    : name(rs.FieldIndex("AccountName")),
+      key(rs.FieldIndex("AccountKey")),
+      details(rs.FieldIndex("Details")),
+      address(rs.FieldIndex("Address")),
+      district(rs.FieldIndex("District")),
+      city(rs.FieldIndex("City")),
+      zip(rs.FieldIndex("Zip")),
+      telephone(rs.FieldIndex("Telephone")) {}
+
 namespace {
 
 using output_internal::AppendHtmlEscaped;
@@ -15,6 +26,7 @@ using output_internal::AppendHtmlValue;
 using output_internal::AppendSpreadInCells;
 using output_internal::AppendValueText;
 using output_internal::CodePageFile;
+using output_internal::LabelFields;
 
 const char* FontName(uint8_t font) {
   switch (font) {
@@ -85,21 +97,6 @@ void AppendLineText(const db::Value& v, std::string& out) {
     AppendEscapedText(v, out);
   }
 }
-
-// Column indexes of the fields a label prints.
-struct LabelFields {
-  int name, key, details, address, district, city, zip, telephone;
-
-  explicit LabelFields(const db::Snapshot& rs)
-      : name(rs.FieldIndex("AccountName")),
-        key(rs.FieldIndex("AccountKey")),
-        details(rs.FieldIndex("Details")),
-        address(rs.FieldIndex("Address")),
-        district(rs.FieldIndex("District")),
-        city(rs.FieldIndex("City")),
-        zip(rs.FieldIndex("Zip")),
-        telephone(rs.FieldIndex("Telephone")) {}
-};
 
 class SheetWriter {
  public:

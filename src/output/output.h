@@ -28,6 +28,9 @@
 #include "workdb/value.h"
 
 namespace zdr {
+namespace db {
+class Snapshot;
+}  // namespace db
 
 class OutputError : public std::runtime_error {
  public:
@@ -124,6 +127,13 @@ inline constexpr std::string_view kFindingsSheetName = "בדיקה";
 
 // Pieces the writers share.
 namespace output_internal {
+
+// Column indexes of the fields a label prints, in a recipients snapshot (the label sheet and
+// the label PDF print the same fields).
+struct LabelFields {
+  int name, key, details, address, district, city, zip, telephone;
+  explicit LabelFields(const db::Snapshot& rs);
+};
 
 // How a character outside Windows-1255 is written.
 enum class Unmappable {

@@ -28,6 +28,8 @@
 namespace zdr {
 namespace {
 
+using output_internal::LabelFields;
+
 constexpr double kPtPerMm = 72.0 / 25.4;
 double Pt(double mm) {
   return mm * kPtPerMm;
@@ -544,21 +546,6 @@ class LabelPainter {
   std::string key_;
   std::vector<PangoLayout*> natural_;
   std::vector<double> sizes_, heights_;
-};
-
-// Column indexes of the fields a label prints.
-struct LabelFields {
-  int name, key, details, address, district, city, zip, telephone;
-
-  explicit LabelFields(const db::Snapshot& rs)
-      : name(rs.FieldIndex("AccountName")),
-        key(rs.FieldIndex("AccountKey")),
-        details(rs.FieldIndex("Details")),
-        address(rs.FieldIndex("Address")),
-        district(rs.FieldIndex("District")),
-        city(rs.FieldIndex("City")),
-        zip(rs.FieldIndex("Zip")),
-        telephone(rs.FieldIndex("Telephone")) {}
 };
 
 // A field's text on a label; a Null field is an empty line that keeps its place.
