@@ -1430,6 +1430,18 @@ T ReadRaw(const unsigned char*& p) {
 }  // namespace
 
 struct Snapshot::Impl {
+  // The statement's column names and source tables; returns their count.
+  int ReadColumnNames(sqlite3_stmt* st) {
+    const int columns = sqlite3_column_count(st);
+    for (int c = 0; c < columns; ++c) {
+      const char* name = sqlite3_column_name(st, c);
+      const char* table = sqlite3_column_table_name(st, c);
+      names.emplace_back(name != nullptr ? name : "");
+      tables.emplace_back(table != nullptr ? table : "");
+    }
+    return columns;
+  }
+
   // A forward snapshot reads its rows back from a temporary table (the spool) as it moves,
   // through the connection it keeps.
   bool forward = false;
@@ -1567,13 +1579,7 @@ Snapshot Database::OpenSnapshot(std::string_view jetSql, SnapshotKind kind) {
     auto snap = std::make_unique<Snapshot::Impl>();
     snap->forward = true;
     snap->shownSql = jetSql;
-    const int columns = sqlite3_column_count(st.get());
-    for (int c = 0; c < columns; ++c) {
-      const char* name = sqlite3_column_name(st.get(), c);
-      const char* table = sqlite3_column_table_name(st.get(), c);
-      snap->names.emplace_back(name != nullptr ? name : "");
-      snap->tables.emplace_back(table != nullptr ? table : "");
-    }
+    const int columns = snap->ReadColumnNames(st.get());
     snap->current.resize(static_cast<size_t>(columns));
     // The rows go once into a temporary table, in the statement's order; the working database
     // keeps temporary tables in a file, so they take no memory however many there are. The
@@ -1616,13 +1622,7 @@ Snapshot Database::OpenSnapshot(std::string_view jetSql, SnapshotKind kind) {
     std::swap(*st.out(), *checked.out());
   }
   auto snap = std::make_unique<Snapshot::Impl>();
-  const int columns = sqlite3_column_count(st.get());
-  for (int c = 0; c < columns; ++c) {
-    const char* name = sqlite3_column_name(st.get(), c);
-    const char* table = sqlite3_column_table_name(st.get(), c);
-    snap->names.emplace_back(name != nullptr ? name : "");
-    snap->tables.emplace_back(table != nullptr ? table : "");
-  }
+  const int columns = snap->ReadColumnNames(st.get());
   auto& out = snap->cells;
   int rc;
   while ((rc = sqlite3_step(st.get())) == SQLITE_ROW) {

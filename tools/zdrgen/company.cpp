@@ -73,6 +73,20 @@ const CodeFile kCodes[] = {{1, 2},  {2, 2},  {3, 2},  {4, 2},  {5, 2},  {6, 2}, 
                            {21, 0}, {22, 0}, {23, 0}, {30, 1}, {31, 1}, {32, 1}, {33, 1},
                            {34, 1}, {35, 1}, {36, 1}, {40, 3}, {41, 3}, {0, 2}};
 
+// The fields of an account record that follow from its truth as they are: all but the key
+// and the name, which the callers write in their own ways.
+void FillAddressFields(const AccountTruth& t, AccountFields& f) {
+  f.sortCode = t.sortCode;
+  f.cutOff = t.cutOff;
+  f.telephone = HostField(t.telephone, 30);
+  f.address = HostField(t.address, 30);
+  f.district = HostField(t.district, 15);
+  f.city = HostField(t.city, 15);
+  f.zip = HostField(t.zip, 5);
+  f.details = HostField(t.details, 50);
+  f.agent = t.agent;
+}
+
 std::string Digits(Random& r, int count) {
   std::string s;
   for (int i = 0; i < count; ++i) s.push_back(static_cast<char>('0' + r.Between(0, 9)));
@@ -318,15 +332,7 @@ struct Generator {
       t.agent = static_cast<uint8_t>(rnd.Between(0, 30));
 
       f.name = HostField(t.name, 30);
-      f.sortCode = t.sortCode;
-      f.cutOff = t.cutOff;
-      f.telephone = HostField(t.telephone, 30);
-      f.address = HostField(t.address, 30);
-      f.district = HostField(t.district, 15);
-      f.city = HostField(t.city, 15);
-      f.zip = HostField(t.zip, 5);
-      f.details = HostField(t.details, 50);
-      f.agent = t.agent;
+      FillAddressFields(t, f);
       records.push_back(AccountRecord(f));
 
       s.key = f.key;
@@ -377,15 +383,7 @@ struct Generator {
         f.name = PadRaw("\xD9 " + HostVisual(t.name), 30);
         t.unambiguousText = false;
       }
-      f.sortCode = t.sortCode;
-      f.cutOff = t.cutOff;
-      f.telephone = HostField(t.telephone, 30);
-      f.address = HostField(t.address, 30);
-      f.district = HostField(t.district, 15);
-      f.city = HostField(t.city, 15);
-      f.zip = HostField(t.zip, 5);
-      f.details = HostField(t.details, 50);
-      f.agent = t.agent;
+      FillAddressFields(t, f);
       records[static_cast<size_t>(t.record - 1)] = AccountRecord(f);
       stored[i].name = f.name;
       stored[i].address = f.address;
