@@ -1,0 +1,427 @@
+#include <algorithm>
+#include <charconv>
+#include <cmath>
+#include <string>
+#include <vector>
+
+#include "workdb/engine.h"
+#include "workdb/engineinternal.h"
+
+namespace zdr::db {
+
+namespace {
+
+// Number of code points in `s`, or -1 when `s` is not well-formed UTF-8.
+int64_t CountUtf8(std::string_view s) {
+  const auto* p = reinterpret_cast<const unsigned char*>(s.data());
+  const auto* end = p + s.size();
+  int64_t count = 0;
+  while (p < end) {
+    const unsigned char c = *p;
+    if (c < 0x80) {
+      ++p;
+    } else if (c >= 0xC2 && c <= 0xDF) {
+      if (end - p < 2 || (p[1] & 0xC0) != 0x80) return -1;
+      p += 2;
+    } else if (c >= 0xE0 && c <= 0xEF) {
+      if (end - p < 3 || (p[1] & 0xC0) != 0x80 || (p[2] & 0xC0) != 0x80) return -1;
+      if (c == 0xE0 && p[1] < 0xA0) return -1;   // overlong
+      if (c == 0xED && p[1] >= 0xA0) return -1;  // surrogate
+      p += 3;
+    } else if (c >= 0xF0 && c <= 0xF4) {
+      if (end - p < 4 || (p[1] & 0xC0) != 0x80 || (p[2] & 0xC0) != 0x80 || (p[3] & 0xC0) != 0x80)
+        return -1;
+      if (c == 0xF0 && p[1] < 0x90) return -1;   // overlong
+      if (c == 0xF4 && p[1] >= 0x90) return -1;  // above U+10FFFF
+      p += 4;
+    } else {
+      return -1;
+    }
+    ++count;
+  }
+  return count;
+}
+
+// One field of the row being added. The text buffer keeps its capacity from row to row, so
+// appending does not allocate once the longest value has been seen.
+struct Slot {
+  enum class Kind : uint8_t { Null, Int, Real, Text };
+  Kind kind = Kind::Null;
+  int64_t i = 0;
+  double d = 0;
+  std::string text;
+};
+
+bool ParseNumber(std::string_view s, int64_t& i, double& d, bool& isInt) {
+  while (!s.empty() && (s.front() == ' ' || s.front() == '\t')) s.remove_prefix(1);
+  while (!s.empty() && (s.back() == ' ' || s.back() == '\t')) s.remove_suffix(1);
+  if (!s.empty() && s.front() == '+') s.remove_prefix(1);
+  if (s.empty()) return false;
+  const char* end = s.data() + s.size();
+  auto ri = std::from_chars(s.data(), end, i);
+  if (ri.ec == std::errc() && ri.ptr == end) {
+    isInt = true;
+    return true;
+  }
+  auto rd = std::from_chars(s.data(), end, d);
+  if (rd.ec == std::errc() && rd.ptr == end) {
+    isInt = false;
+    return true;
+  }
+  return false;
+}
+
+}  // namespace
+
+struct TableRecordset::Impl {
+  std::shared_ptr<Connection> conn;
+  sqlite3_stmt* insert = nullptr;
+  std::string table;
+  std::vector<FieldDef> fields;
+  std::vector<IndexDef> indexes;
+  std::vector<Slot> row;
+  bool editing = false;
+
+  Impl() = default;
+  Impl(const Impl&) = delete;
+  Impl& operator=(const Impl&) = delete;
+  ~Impl() { CloseQuietly(); }
+
+  // Returns the commit's failure, empty when the rows are in the file.
+  std::string CloseQuietly() {
+    if (!conn) return std::string();
+    sqlite3_finalize(insert);
+    insert = nullptr;
+    std::string failure = conn->RecordsetClosed();
+    conn.reset();
+    return failure;
+  }
+
+  Slot& Editable(int field) {
+    if (!conn) throw EngineError(kErrEngine, "הטבלה '" + table + "' סגורה.");
+    if (!editing) {
+      throw EngineError(kErrNotEditing, "אין רשומה חדשה בעריכה: יש לקרוא ל-AddNew תחילה.");
+    }
+    if (field < 0 || static_cast<size_t>(field) >= row.size()) {
+      throw EngineError(kErrNoSuchField,
+                        "אין שדה במקום " + std::to_string(field) + " בטבלה '" + table + "'.");
+    }
+    return row[static_cast<size_t>(field)];
+  }
+
+  [[noreturn]] void ConversionError(int field, std::string_view value) const {
+    throw EngineError(kErrTypeConversion, "לא ניתן להמיר את הערך '" + std::string(value) +
+                                              "' לסוג השדה '" + fields[field].name + "' (" +
+                                              TypeName(fields[field].type) + ").");
+  }
+
+  [[noreturn]] void Overflow(const FieldDef& f, const std::string& value) const {
+    int64_t lo, hi;
+    IntegerRange(f.type, lo, hi);
+    throw EngineError(kErrNumericOverflow, "הערך " + value + " חורג מתחום השדה '" + f.name + "' (" +
+                                               TypeName(f.type) + ": " + std::to_string(lo) +
+                                               " עד " + std::to_string(hi) + ").");
+  }
+
+  // Checks slot `i` against its field and binds it. Throws the field's refusal.
+  void CheckAndBind(size_t i) {
+    const FieldDef& f = fields[i];
+    Slot& s = row[i];
+    const int param = static_cast<int>(i) + 1;
+    if (s.kind == Slot::Kind::Null) {
+      sqlite3_bind_null(insert, param);
+      return;
+    }
+    switch (f.type) {
+      case FieldType::Text: {
+        if (s.text.empty()) {
+          throw EngineError(kErrZeroLength,
+                            "השדה '" + f.name + "' אינו יכול להכיל מחרוזת באורך אפס.");
+        }
+        const int64_t chars = CountUtf8(s.text);
+        if (chars < 0) {
+          throw EngineError(kErrTypeConversion,
+                            "הטקסט לשדה '" + f.name + "' אינו UTF-8 תקין; הרשומה לא נשמרה.");
+        }
+        if (chars > f.size) {
+          throw EngineError(kErrFieldTooSmall,
+                            "הטקסט ארוך מדי עבור השדה '" + f.name + "': " + std::to_string(chars) +
+                                " תווים, והשדה מקבל עד " + std::to_string(f.size) + ".");
+        }
+        // The buffer stays untouched until the statement has been stepped and reset.
+        sqlite3_bind_text(insert, param, s.text.data(), static_cast<int>(s.text.size()),
+                          SQLITE_STATIC);
+        return;
+      }
+      case FieldType::Byte:
+      case FieldType::Integer:
+      case FieldType::Long: {
+        int64_t lo, hi;
+        IntegerRange(f.type, lo, hi);
+        int64_t v = s.i;
+        if (s.kind == Slot::Kind::Real) {
+          // Whole numbers by round-half-even, as the desktop engine converts.
+          const double r = std::nearbyint(s.d);
+          if (!std::isfinite(r) || r < static_cast<double>(lo) || r > static_cast<double>(hi)) {
+            char buf[32];
+            const auto res = std::to_chars(buf, buf + sizeof buf, s.d);
+            Overflow(f, std::string(buf, res.ptr));
+          }
+          v = static_cast<int64_t>(r);
+        }
+        if (v < lo || v > hi) Overflow(f, std::to_string(v));
+        sqlite3_bind_int64(insert, param, v);
+        return;
+      }
+      case FieldType::Double:
+      case FieldType::Date:
+        sqlite3_bind_double(insert, param,
+                            s.kind == Slot::Kind::Int ? static_cast<double>(s.i) : s.d);
+        return;
+      case FieldType::Boolean:
+        sqlite3_bind_int(insert, param, s.i != 0 ? -1 : 0);
+        return;
+    }
+  }
+
+  // Names the unique index that refused the row, for the description.
+  std::string RefusingIndex(std::string_view message) const {
+    const size_t at = message.find("failed: ");
+    if (at == std::string_view::npos) return "";
+    std::vector<std::string_view> cols;
+    std::string_view rest = message.substr(at + 8);
+    while (!rest.empty()) {
+      const size_t comma = rest.find(", ");
+      std::string_view item = rest.substr(0, comma);
+      if (const size_t dot = item.find('.'); dot != std::string_view::npos) {
+        item = item.substr(dot + 1);
+      }
+      cols.push_back(item);
+      if (comma == std::string_view::npos) break;
+      rest = rest.substr(comma + 2);
+    }
+    for (const IndexDef& ix : indexes) {
+      if (ix.fields.size() != cols.size()) continue;
+      bool same = true;
+      for (size_t k = 0; k < cols.size() && same; ++k) same = EqualsNoCase(ix.fields[k], cols[k]);
+      if (same) return ix.name;
+    }
+    return "";
+  }
+};
+
+TableRecordset::TableRecordset(std::unique_ptr<Impl> impl) : impl_(std::move(impl)) {}
+TableRecordset::TableRecordset(TableRecordset&&) noexcept = default;
+TableRecordset& TableRecordset::operator=(TableRecordset&&) noexcept = default;
+TableRecordset::~TableRecordset() = default;
+
+TableRecordset Database::OpenTable(const std::string& table) {
+  if (!impl_) throw EngineError(kErrEngine, "מסד הנתונים סגור.");
+  TableDef def(table);
+  std::string schema;
+  if (!impl_->Locate(table, schema, def)) {
+    throw EngineError(kErrNoSuchObject, "הטבלה '" + table + "' אינה קיימת.");
+  }
+  auto rs = std::make_unique<TableRecordset::Impl>();
+  rs->table = def.name;
+  std::string sql = "INSERT INTO " + QuoteId(schema) + "." + QuoteId(def.name) + " (";
+  std::string params;
+  for (size_t i = 0; i < def.fields.size(); ++i) {
+    if (i > 0) {
+      sql += ", ";
+      params += ", ";
+    }
+    sql += QuoteId(def.fields[i].name);
+    params += "?" + std::to_string(i + 1);
+  }
+  sql += ") VALUES (" + params + ")";
+  sqlite3* h = impl_->db();
+  if (sqlite3_prepare_v3(h, sql.c_str(), -1, SQLITE_PREPARE_PERSISTENT, &rs->insert, nullptr) !=
+      SQLITE_OK) {
+    const std::string message = SqliteMessage(h);
+    sqlite3_finalize(rs->insert);
+    rs->insert = nullptr;
+    throw EngineError(kErrEngine, "לא ניתן לפתוח את הטבלה '" + table + "': " + message);
+  }
+  rs->conn = impl_->conn;
+  try {
+    rs->conn->RecordsetOpened();
+  } catch (...) {
+    sqlite3_finalize(rs->insert);
+    rs->insert = nullptr;
+    rs->conn.reset();
+    throw;
+  }
+  rs->fields = std::move(def.fields);
+  rs->indexes = std::move(def.indexes);
+  rs->row.resize(rs->fields.size());
+  return TableRecordset(std::move(rs));
+}
+
+void TableRecordset::AddNew() {
+  if (!impl_ || !impl_->conn) throw EngineError(kErrEngine, "הטבלה סגורה.");
+  for (Slot& s : impl_->row) s.kind = Slot::Kind::Null;
+  impl_->editing = true;
+}
+
+int TableRecordset::FieldIndex(std::string_view name) const {
+  if (impl_) {
+    for (size_t i = 0; i < impl_->fields.size(); ++i) {
+      if (EqualsNoCase(impl_->fields[i].name, name)) return static_cast<int>(i);
+    }
+  }
+  throw EngineError(kErrNoSuchField, "השדה '" + std::string(name) + "' אינו קיים בטבלה '" +
+                                         (impl_ ? impl_->table : std::string()) + "'.");
+}
+
+void TableRecordset::SetNull(int field) {
+  if (!impl_) throw EngineError(kErrEngine, "הטבלה סגורה.");
+  impl_->Editable(field).kind = Slot::Kind::Null;
+}
+
+void TableRecordset::SetText(int field, std::string_view utf8) {
+  if (!impl_) throw EngineError(kErrEngine, "הטבלה סגורה.");
+  Slot& s = impl_->Editable(field);
+  const FieldType type = impl_->fields[field].type;
+  if (type == FieldType::Text) {
+    s.text.assign(utf8.data(), utf8.size());
+    s.kind = Slot::Kind::Text;
+    return;
+  }
+  int64_t i = 0;
+  double d = 0;
+  bool isInt = false;
+  if (type == FieldType::Boolean) {
+    if (EqualsNoCase(utf8, "true") || EqualsNoCase(utf8, "yes")) {
+      s.kind = Slot::Kind::Int, s.i = -1;
+      return;
+    }
+    if (EqualsNoCase(utf8, "false") || EqualsNoCase(utf8, "no")) {
+      s.kind = Slot::Kind::Int, s.i = 0;
+      return;
+    }
+  }
+  if (!ParseNumber(utf8, i, d, isInt)) impl_->ConversionError(field, utf8);
+  if (isInt) {
+    SetInt(field, i);
+  } else {
+    SetDouble(field, d);
+  }
+}
+
+void TableRecordset::SetInt(int field, int64_t v) {
+  if (!impl_) throw EngineError(kErrEngine, "הטבלה סגורה.");
+  Slot& s = impl_->Editable(field);
+  switch (impl_->fields[field].type) {
+    case FieldType::Text: {
+      char buf[24];
+      const auto res = std::to_chars(buf, buf + sizeof buf, v);
+      s.text.assign(buf, res.ptr);
+      s.kind = Slot::Kind::Text;
+      return;
+    }
+    case FieldType::Boolean:
+      s.kind = Slot::Kind::Int, s.i = v != 0 ? -1 : 0;
+      return;
+    default:
+      s.kind = Slot::Kind::Int, s.i = v;
+      return;
+  }
+}
+
+void TableRecordset::SetDouble(int field, double v) {
+  if (!impl_) throw EngineError(kErrEngine, "הטבלה סגורה.");
+  Slot& s = impl_->Editable(field);
+  switch (impl_->fields[field].type) {
+    case FieldType::Text: {
+      char buf[32];
+      const auto res = std::to_chars(buf, buf + sizeof buf, v);
+      s.text.assign(buf, res.ptr);
+      s.kind = Slot::Kind::Text;
+      return;
+    }
+    case FieldType::Boolean:
+      s.kind = Slot::Kind::Int, s.i = v != 0 ? -1 : 0;
+      return;
+    default:
+      s.kind = Slot::Kind::Real, s.d = v;
+      return;
+  }
+}
+
+void TableRecordset::SetBool(int field, bool v) {
+  if (!impl_) throw EngineError(kErrEngine, "הטבלה סגורה.");
+  if (impl_->fields.size() > static_cast<size_t>(std::max(field, 0)) &&
+      impl_->fields[field].type == FieldType::Text) {
+    SetText(field, v ? "True" : "False");
+    return;
+  }
+  SetInt(field, v ? -1 : 0);
+}
+
+void TableRecordset::SetDate(int field, Date d) {
+  if (!impl_) throw EngineError(kErrEngine, "הטבלה סגורה.");
+  if (impl_->fields.size() > static_cast<size_t>(std::max(field, 0)) &&
+      impl_->fields[field].type == FieldType::Text) {
+    SetText(field, FormatDate(d));
+    return;
+  }
+  SetInt(field, d.serial);
+}
+
+void TableRecordset::Set(std::string_view name, const Value& v) {
+  const int field = FieldIndex(name);
+  if (IsNull(v)) {
+    SetNull(field);
+  } else if (const auto* i = std::get_if<int64_t>(&v)) {
+    SetInt(field, *i);
+  } else if (const auto* d = std::get_if<double>(&v)) {
+    SetDouble(field, *d);
+  } else {
+    SetText(field, std::get<std::string>(v));
+  }
+}
+
+void TableRecordset::Update() {
+  if (!impl_ || !impl_->conn) throw EngineError(kErrEngine, "הטבלה סגורה.");
+  Impl& r = *impl_;
+  if (!r.editing) {
+    throw EngineError(kErrNotEditing, "אין רשומה חדשה בעריכה: יש לקרוא ל-AddNew תחילה.");
+  }
+  for (size_t i = 0; i < r.row.size(); ++i) r.CheckAndBind(i);
+  const int rc = sqlite3_step(r.insert);
+  if (rc == SQLITE_DONE) {
+    sqlite3_reset(r.insert);
+    r.editing = false;
+    return;
+  }
+  sqlite3* h = r.conn->db;
+  // sqlite3_reset returns the step's error and keeps the message until the next call.
+  sqlite3_reset(r.insert);
+  const int extended = sqlite3_extended_errcode(h);
+  const std::string message = SqliteMessage(h);
+  if (extended == SQLITE_CONSTRAINT_PRIMARYKEY || extended == SQLITE_CONSTRAINT_UNIQUE) {
+    const std::string index = r.RefusingIndex(message);
+    throw EngineError(kErrDuplicateKey, "הרשומה לא נשמרה: הערך כבר קיים באינדקס הייחודי" +
+                                            (index.empty() ? std::string() : " '" + index + "'") +
+                                            " של הטבלה '" + r.table + "'.");
+  }
+  if (extended == SQLITE_CONSTRAINT_NOTNULL) {
+    std::string field = message.substr(std::min(message.size(), message.find("failed: ") + 8));
+    if (const size_t dot = field.find('.'); dot != std::string::npos) field = field.substr(dot + 1);
+    throw EngineError(kErrNullKey, "השדה '" + field +
+                                       "' שייך למפתח הראשי ואינו יכול להיות ריק (Null); הרשומה "
+                                       "לא נשמרה.");
+  }
+  throw StepFailure(h, extended, "");
+}
+
+void TableRecordset::Close() {
+  if (!impl_) return;
+  const std::string failure = impl_->CloseQuietly();
+  if (!failure.empty()) {
+    throw EngineError(kErrEngine, "לא ניתן לשמור את הרשומות בקובץ: " + failure);
+  }
+}
+
+}  // namespace zdr::db
