@@ -391,6 +391,76 @@ bool Database::Impl::Locate(const std::string& table, std::string& schema, Table
   return ReadTableDef(db(), schema, table, def);
 }
 
+namespace {
+
+// Whether `text` holds `word`, without regard to the case of ASCII letters.
+bool ContainsNoCase(std::string_view text, std::string_view word) {
+  if (word.empty() || word.size() > text.size()) return word.empty();
+  for (size_t i = 0; i + word.size() <= text.size(); ++i) {
+    if (EqualsNoCase(text.substr(i, word.size()), word)) return true;
+  }
+  return false;
+}
+
+}  // namespace
+
+std::string Database::Impl::FindKeptDistinct(std::string_view table, std::string_view field) const {
+  if (FindLink(table) != nullptr) return "";
+  Statement st;
+  const std::string sql =
+      "SELECT name FROM main.sqlite_master WHERE type = 'table' AND name = ?1 COLLATE NOCASE";
+  Prepare(sql, st, sql);
+  const std::string name = KeptDistinctTable(table, field);
+  sqlite3_bind_text(st.get(), 1, name.data(), static_cast<int>(name.size()), SQLITE_TRANSIENT);
+  const int rc = sqlite3_step(st.get());
+  if (rc == SQLITE_ROW) return reinterpret_cast<const char*>(sqlite3_column_text(st.get(), 0));
+  if (rc != SQLITE_DONE) throw StepFailure(db(), rc, sql);
+  return "";
+}
+
+std::vector<std::string> Database::Impl::KeptDistinctFields(const std::string& table) const {
+  Statement st;
+  const std::string sql =
+      "SELECT substr(name, length(?1) + 1) FROM main.sqlite_master WHERE type = 'table'"
+      " AND substr(name, 1, length(?1)) = ?1 COLLATE NOCASE";
+  Prepare(sql, st, sql);
+  const std::string prefix = KeptDistinctTable(table, "");
+  sqlite3_bind_text(st.get(), 1, prefix.data(), static_cast<int>(prefix.size()), SQLITE_TRANSIENT);
+  std::vector<std::string> fields;
+  int rc;
+  while ((rc = sqlite3_step(st.get())) == SQLITE_ROW) {
+    fields.emplace_back(reinterpret_cast<const char*>(sqlite3_column_text(st.get(), 0)));
+  }
+  if (rc != SQLITE_DONE) throw StepFailure(db(), rc, sql);
+  return fields;
+}
+
+void Database::Impl::DropKeptDistinctNamedIn(std::string_view jetSql) const {
+  std::vector<std::string> drop;
+  {
+    Statement st;
+    const std::string sql =
+        "SELECT name, substr(name, 1, instr(name, '.distinct.') - 1) FROM main.sqlite_master"
+        " WHERE type = 'table' AND instr(name, '.distinct.') > 0";
+    Prepare(sql, st, sql);
+    int rc;
+    while ((rc = sqlite3_step(st.get())) == SQLITE_ROW) {
+      const auto* table = reinterpret_cast<const char*>(sqlite3_column_text(st.get(), 1));
+      if (ContainsNoCase(jetSql, table)) {
+        drop.emplace_back(reinterpret_cast<const char*>(sqlite3_column_text(st.get(), 0)));
+      }
+    }
+    if (rc != SQLITE_DONE) throw StepFailure(db(), rc, sql);
+  }
+  for (const std::string& name : drop) Exec("DROP TABLE main." + QuoteId(name));
+}
+
+DistinctValuesTable Database::Impl::KeptDistinctSource() const {
+  return [this](std::string_view table, std::string_view field) {
+    return FindKeptDistinct(table, field);
+  };
+}
+
 Database::Database(std::unique_ptr<Impl> impl) : impl_(std::move(impl)) {}
 Database::Database(Database&&) noexcept = default;
 Database& Database::operator=(Database&&) noexcept = default;
@@ -584,6 +654,7 @@ int64_t Database::Execute(std::string_view jetSql) {
   const EnforcedChecks checks(impl_->db());
   Statement st;
   impl_->Prepare(sql, st, jetSql);
+  if (!sqlite3_stmt_readonly(st.get())) impl_->DropKeptDistinctNamedIn(jetSql);
   int rc;
   while ((rc = sqlite3_step(st.get())) == SQLITE_ROW) {
   }

@@ -71,6 +71,11 @@ struct TableDef {
   std::string name;
   std::vector<FieldDef> fields;
   std::vector<IndexDef> indexes;
+  // Text fields of the primary key whose distinct values the engine keeps in a table of their
+  // own as rows are appended, so that a statement's "(Select Distinct F From T)" reads those
+  // values instead of every row of T. Kept only while every row came through a recordset: a
+  // statement that changes the table's rows drops them, and the subquery then reads T again.
+  std::vector<std::string> keptDistinct;
 
   explicit TableDef(std::string n) : name(std::move(n)) {}
   TableDef& Field(std::string fieldName, FieldType type, int size = 0) {
@@ -80,6 +85,10 @@ struct TableDef {
   TableDef& Index(std::string indexName, std::vector<std::string> indexFields, bool isPrimary,
                   bool isUnique) {
     indexes.push_back({std::move(indexName), std::move(indexFields), isPrimary, isUnique});
+    return *this;
+  }
+  TableDef& KeepDistinct(std::string fieldName) {
+    keptDistinct.push_back(std::move(fieldName));
     return *this;
   }
 };
@@ -141,8 +150,9 @@ enum class SnapshotKind {
   Whole,
   // Kept in a temporary file when opened and read back one row at a time as the snapshot
   // moves forward, so memory stays flat however many rows there are. Only MoveNext moves
-  // (MoveFirst is allowed while on the first row); the snapshot keeps the database's
-  // connection until it is closed. For statements that only read (others are read whole).
+  // forward, and MoveFirst reads the rows again from the first; the snapshot keeps the
+  // database's connection and the temporary file until it is closed. For statements that only
+  // read (others are read whole).
   Forward,
 };
 

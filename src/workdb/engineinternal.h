@@ -13,6 +13,7 @@
 #include <vector>
 
 #include "workdb/engine.h"
+#include "workdb/jetsql.h"
 
 namespace zdr::db {
 
@@ -22,6 +23,11 @@ inline constexpr std::string_view kCheckTooLong = "zdr_too_long:";
 inline constexpr std::string_view kCheckRange = "zdr_range:";
 
 bool EqualsNoCase(std::string_view a, std::string_view b);
+// The table that keeps the distinct values of `table`.`field` (see TableDef::keptDistinct). It
+// exists only while it holds exactly those values.
+inline std::string KeptDistinctTable(std::string_view table, std::string_view field) {
+  return std::string(table) + ".distinct." + std::string(field);
+}
 std::string QuoteId(std::string_view id);
 const char* TypeName(FieldType t);
 // The values an integer field of type `t` holds.
@@ -127,6 +133,15 @@ struct Database::Impl {
   void LoadLinks();
   // Where the rows of `table` live: "main", or the schema of a resolved link.
   bool Locate(const std::string& table, std::string& schema, TableDef& def) const;
+  // The kept-distinct table of a local table's field as it is stored, or "" when none is kept.
+  std::string FindKeptDistinct(std::string_view table, std::string_view field) const;
+  // The fields of a local table whose distinct values are kept.
+  std::vector<std::string> KeptDistinctFields(const std::string& table) const;
+  // Drops what is kept of the distinct values of every local table `jetSql` names: the
+  // statement may change their rows.
+  void DropKeptDistinctNamedIn(std::string_view jetSql) const;
+  // For the translator: where a SELECT may read a field's distinct values.
+  DistinctValuesTable KeptDistinctSource() const;
 };
 
 }  // namespace zdr::db

@@ -5,6 +5,7 @@
 // between tokens is never searched, so nothing inside a literal is ever rewritten.
 #include "workdb/jetsql.h"
 
+#include <cstddef>
 #include <cstdint>
 #include <string>
 #include <vector>
@@ -562,9 +563,28 @@ std::string TranslateDelete(const Range& t) {
   return out;
 }
 
+// "( SELECT DISTINCT F FROM T )" -> "( SELECT F FROM <table of T's distinct F values> )" where
+// such a table is kept. Only this exact shape: a WHERE, a qualifier or a second column would
+// make the subquery's values differ from the kept ones.
+void RewriteDistinctSubqueries(Range& t, const DistinctValuesTable& distinctValues) {
+  for (size_t i = 0; i + 6 < t.size(); ++i) {
+    if (t[i].kind != Tok::LParen || !IsWord(t[i + 1], "SELECT") || !IsWord(t[i + 2], "DISTINCT") ||
+        !IsName(t[i + 3]) || IsExpressionKeyword(t[i + 3]) || !IsWord(t[i + 4], "FROM") ||
+        !IsName(t[i + 5]) || t[i + 6].kind != Tok::RParen) {
+      continue;
+    }
+    const std::string kept = distinctValues(t[i + 5].text, t[i + 3].text);
+    if (kept.empty()) continue;
+    t[i + 5].kind = Tok::Bracketed;
+    t[i + 5].text = kept;
+    // The kept values are distinct already.
+    t.erase(t.begin() + static_cast<std::ptrdiff_t>(i + 2));
+  }
+}
+
 }  // namespace
 
-std::string TranslateJetSql(std::string_view jet) {
+std::string TranslateJetSql(std::string_view jet, const DistinctValuesTable& distinctValues) {
   Range t = Tokenize(jet);
   if (t.empty()) Fail("משפט ריק");
   CheckParentheses(t);
@@ -573,6 +593,7 @@ std::string TranslateJetSql(std::string_view jet) {
   if (IsWord(first, "UPDATE")) return TranslateUpdate(t);
   if (IsWord(first, "DELETE")) return TranslateDelete(t);
   if (IsWord(first, "SELECT") || IsWord(first, "INSERT") || first.kind == Tok::LParen) {
+    if (distinctValues && !IsWord(first, "INSERT")) RewriteDistinctSubqueries(t, distinctValues);
     std::string out;
     out.reserve(jet.size() + 16);
     Emit(out, t, 0, t.size(), false);

@@ -6,6 +6,7 @@
 // stays a literal.
 #pragma once
 
+#include <functional>
 #include <string>
 #include <string_view>
 
@@ -14,7 +15,14 @@ namespace zdr::db {
 // Translates one Jet statement (SELECT, UPDATE, including UPDATE ... INNER JOIN ... SET)
 // into SQLite SQL. `LIKE` is kept as LIKE: the engine replaces SQLite's like() with
 // JetLike. Throws EngineError(kErrSyntax) for what it cannot translate.
-std::string TranslateJetSql(std::string_view jet);
+//
+// `distinctValues`, when given, names for a table and a field (as the statement spells them)
+// a table that holds exactly that field's distinct values, or returns "" when there is none.
+// In a SELECT, a subquery "(Select Distinct F From T)" then reads that table instead of every
+// row of T: the same values, without a pass over T.
+using DistinctValuesTable =
+    std::function<std::string(std::string_view table, std::string_view field)>;
+std::string TranslateJetSql(std::string_view jet, const DistinctValuesTable& distinctValues = {});
 
 // Jet's LIKE over UTF-8 text: `*` any run, `?` one character, `#` one digit, `[abc]`,
 // `[a-z]` and `[!abc]` one character of (or not of) the list; every other character,

@@ -1,7 +1,11 @@
 #include <algorithm>
 #include <charconv>
 #include <cmath>
+#include <cstdint>
+#include <cstring>
 #include <string>
+#include <string_view>
+#include <unordered_set>
 #include <vector>
 
 #include "workdb/engine.h"
@@ -71,11 +75,88 @@ bool ParseNumber(std::string_view s, int64_t& i, double& d, bool& isInt) {
   return false;
 }
 
+// A set of short texts for the hot path of appending rows: a key of up to 15 bytes lives in its
+// slot of an open-addressing table, so a lookup of a key already there (nearly every lookup)
+// touches one cache line. Longer keys go to an ordinary set.
+class TextSet {
+ public:
+  // Adds `s`; returns false when it was there already.
+  bool Insert(std::string_view s) {
+    if (s.size() > kInline) return long_.emplace(s).second;
+    if ((count_ + 1) * 4 > slots_.size() * 3) Grow();
+    Slot& slot = Find(s);
+    if (slot.len != 0) return false;
+    slot.len = static_cast<uint8_t>(s.size() + 1);
+    std::memcpy(slot.bytes, s.data(), s.size());
+    ++count_;
+    return true;
+  }
+
+  // Brings the slot of `s` towards the cache, so that an Insert after other work finds it there.
+  void Prefetch(std::string_view s) const {
+    if (s.size() <= kInline && !slots_.empty()) {
+      __builtin_prefetch(&slots_[Hash(s) & (slots_.size() - 1)]);
+    }
+  }
+
+ private:
+  static constexpr size_t kInline = 15;
+  struct Slot {
+    uint8_t len = 0;  // the key's length + 1; 0: empty
+    char bytes[kInline] = {};
+  };
+
+  static uint64_t Hash(std::string_view s) {
+    uint64_t a = 0, b = 0;
+    std::memcpy(&a, s.data(), std::min<size_t>(s.size(), 8));
+    if (s.size() > 8) std::memcpy(&b, s.data() + 8, s.size() - 8);
+    // Every byte reaches the low bits the table indexes by.
+    uint64_t h = (a ^ (s.size() << 56)) * 0x9E3779B97F4A7C15ULL ^ b * 0xC2B2AE3D27D4EB4FULL;
+    h ^= h >> 32;
+    h *= 0xD6E8FEB86659FD93ULL;
+    return h ^ (h >> 29);
+  }
+
+  // The slot that holds `s`, or the empty slot where it belongs.
+  Slot& Find(std::string_view s) {
+    const size_t mask = slots_.size() - 1;
+    for (size_t i = Hash(s) & mask;; i = (i + 1) & mask) {
+      Slot& slot = slots_[i];
+      if (slot.len == 0) return slot;
+      if (slot.len == s.size() + 1 && std::memcmp(slot.bytes, s.data(), s.size()) == 0) {
+        return slot;
+      }
+    }
+  }
+
+  void Grow() {
+    std::vector<Slot> old(std::max<size_t>(1024, slots_.size() * 2));
+    old.swap(slots_);
+    for (const Slot& slot : old) {
+      if (slot.len != 0) Find({slot.bytes, slot.len - 1u}) = slot;
+    }
+  }
+
+  std::vector<Slot> slots_;
+  size_t count_ = 0;
+  std::unordered_set<std::string> long_;
+};
+
+// The distinct values of one field as rows are appended: each value new to this recordset is
+// offered once to the kept table (which may hold it from an earlier recordset already).
+struct KeptField {
+  size_t field = 0;
+  std::string keptTable;
+  sqlite3_stmt* insert = nullptr;
+  TextSet seen;
+};
+
 }  // namespace
 
 struct TableRecordset::Impl {
   std::shared_ptr<Connection> conn;
   sqlite3_stmt* insert = nullptr;
+  std::vector<KeptField> kept;
   std::string table;
   std::vector<FieldDef> fields;
   std::vector<IndexDef> indexes;
@@ -92,6 +173,8 @@ struct TableRecordset::Impl {
     if (!conn) return std::string();
     sqlite3_finalize(insert);
     insert = nullptr;
+    for (KeptField& k : kept) sqlite3_finalize(k.insert);
+    kept.clear();
     std::string failure = conn->RecordsetClosed();
     conn.reset();
     return failure;
@@ -184,6 +267,28 @@ struct TableRecordset::Impl {
     }
   }
 
+  // Records the appended row's values of the kept fields. When a value cannot be kept, what
+  // is kept of that field is dropped, and statements read the table itself again: the row is
+  // stored and answers stay right. Only when even that fails is the failure raised.
+  void KeepDistinct() {
+    for (size_t i = 0; i < kept.size(); ++i) {
+      KeptField& k = kept[i];
+      const std::string& value = row[k.field].text;
+      if (!k.seen.Insert(value)) continue;
+      sqlite3_bind_text(k.insert, 1, value.data(), static_cast<int>(value.size()), SQLITE_STATIC);
+      const int rc = sqlite3_step(k.insert);
+      sqlite3_reset(k.insert);
+      if (rc == SQLITE_DONE) continue;
+      const EngineError failure = StepFailure(conn->db, rc, "");
+      sqlite3_finalize(k.insert);
+      const std::string drop = "DROP TABLE main." + QuoteId(k.keptTable);
+      kept.erase(kept.begin() + static_cast<std::ptrdiff_t>(i--));
+      if (sqlite3_exec(conn->db, drop.c_str(), nullptr, nullptr, nullptr) != SQLITE_OK) {
+        throw failure;
+      }
+    }
+  }
+
   // Names the unique index that refused the row, for the description.
   std::string RefusingIndex(std::string_view message) const {
     const size_t at = message.find("failed: ");
@@ -232,7 +337,8 @@ TableRecordset Database::OpenTable(const std::string& table) {
       params += ", ";
     }
     sql += QuoteId(def.fields[i].name);
-    params += "?" + std::to_string(i + 1);
+    params += '?';
+    params += std::to_string(i + 1);
   }
   sql += ") VALUES (" + params + ")";
   sqlite3* h = impl_->db();
@@ -251,6 +357,24 @@ TableRecordset Database::OpenTable(const std::string& table) {
     rs->insert = nullptr;
     rs->conn.reset();
     throw;
+  }
+  if (schema == "main") {
+    for (const std::string& name : impl_->KeptDistinctFields(def.name)) {
+      KeptField k;
+      for (size_t i = 0; i < def.fields.size(); ++i) {
+        if (EqualsNoCase(def.fields[i].name, name)) k.field = i;
+      }
+      k.keptTable = KeptDistinctTable(def.name, name);
+      const std::string keepSql =
+          "INSERT OR IGNORE INTO main." + QuoteId(k.keptTable) + " VALUES (?1)";
+      if (sqlite3_prepare_v3(h, keepSql.c_str(), -1, SQLITE_PREPARE_PERSISTENT, &k.insert,
+                             nullptr) != SQLITE_OK) {
+        const std::string message = SqliteMessage(h);
+        sqlite3_finalize(k.insert);
+        throw EngineError(kErrEngine, "לא ניתן לפתוח את הטבלה '" + table + "': " + message);
+      }
+      rs->kept.push_back(std::move(k));
+    }
   }
   rs->fields = std::move(def.fields);
   rs->indexes = std::move(def.indexes);
@@ -389,10 +513,13 @@ void TableRecordset::Update() {
     throw EngineError(kErrNotEditing, "אין רשומה חדשה בעריכה: יש לקרוא ל-AddNew תחילה.");
   }
   for (size_t i = 0; i < r.row.size(); ++i) r.CheckAndBind(i);
+  // The kept values' lookup after the step would wait on memory; the step hides the wait.
+  for (const KeptField& k : r.kept) k.seen.Prefetch(r.row[k.field].text);
   const int rc = sqlite3_step(r.insert);
   if (rc == SQLITE_DONE) {
     sqlite3_reset(r.insert);
     r.editing = false;
+    if (!r.kept.empty()) r.KeepDistinct();
     return;
   }
   sqlite3* h = r.conn->db;

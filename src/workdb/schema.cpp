@@ -126,13 +126,17 @@ std::vector<TableDef> WorkDbTables() {
   transact.Field("FileID", FieldType::Long)
       .Field("TransID", FieldType::Long)
       .Field("AccountKey", FieldType::Text, 8)
-      .Index("PrimaryKey", {"FileID", "TransID", "AccountKey"}, true, true);
+      .Index("PrimaryKey", {"FileID", "TransID", "AccountKey"}, true, true)
+      // The recipients statement asks which accounts have ledger rows: read from the accounts
+      // kept here rather than from every ledger row.
+      .KeepDistinct("AccountKey");
   tables.push_back(std::move(transact));
 
   TableDef cash("tCash");
   cash.Field("TransID", FieldType::Long)
       .Field("AccountKey", FieldType::Text, 8)
-      .Index("PrimaryKey", {"TransID", "AccountKey"}, true, true);
+      .Index("PrimaryKey", {"TransID", "AccountKey"}, true, true)
+      .KeepDistinct("AccountKey");
   tables.push_back(std::move(cash));
 
   TableDef item("tItem");

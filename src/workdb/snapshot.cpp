@@ -117,10 +117,8 @@ struct Snapshot::Impl {
     }
     done = true;
     ++pos;
-    if (rc == SQLITE_DONE) {
-      Release();
-      return;
-    }
+    // The spool stays until Close: MoveFirst may read it again.
+    if (rc == SQLITE_DONE) return;
     const EngineError failure = StepFailure(conn->db, rc, shownSql);
     Release();
     throw failure;
@@ -174,9 +172,18 @@ Snapshot::~Snapshot() = default;
 
 Snapshot Database::OpenSnapshot(std::string_view jetSql, SnapshotKind kind) {
   if (!impl_) throw EngineError(kErrEngine, "מסד הנתונים סגור.");
-  const std::string sql = TranslateJetSql(jetSql);
+  std::string sql = TranslateJetSql(jetSql, impl_->KeptDistinctSource());
   Statement st;
   impl_->Prepare(sql, st, jetSql);
+  if (!sqlite3_stmt_readonly(st.get())) {
+    // A statement that writes may change the rows whose distinct values are kept: those are
+    // dropped, and the statement reads the tables themselves.
+    impl_->DropKeptDistinctNamedIn(jetSql);
+    sql = TranslateJetSql(jetSql);
+    Statement plain;
+    impl_->Prepare(sql, plain, jetSql);
+    std::swap(*st.out(), *plain.out());
+  }
   if (kind == SnapshotKind::Forward && sqlite3_stmt_readonly(st.get())) {
     auto snap = std::make_unique<Snapshot::Impl>();
     snap->forward = true;
@@ -209,7 +216,8 @@ Snapshot Database::OpenSnapshot(std::string_view jetSql, SnapshotKind kind) {
     impl_->Prepare(readSql, read, readSql);
     std::swap(snap->stmt, *read.out());
     snap->StepForward();
-    if (snap->done) {
+    if (snap->done) {  // no rows: nothing to read again
+      snap->Release();
       snap->empty = true;
       snap->pos = -1;
     }
@@ -272,7 +280,12 @@ bool Snapshot::AtEnd() const {
 void Snapshot::MoveFirst() {
   impl_->RequireRows();
   if (impl_->forward) {
-    if (impl_->pos != 0 || impl_->done) Impl::ForwardOnly();
+    if (impl_->pos == 0 && !impl_->done) return;
+    if (impl_->stmt == nullptr) throw EngineError(kErrEngine, "הרשומות כבר נסגרו.");
+    sqlite3_reset(impl_->stmt);
+    impl_->pos = -1;
+    impl_->done = false;
+    impl_->StepForward();
     return;
   }
   impl_->MoveTo(0);

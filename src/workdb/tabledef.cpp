@@ -74,6 +74,19 @@ const IndexDef* CheckTableDef(const TableDef& def) {
       primary = &ix;
     }
   }
+  // Kept distinct values come from a Text field of the primary key: never Null, so the kept
+  // values and the subquery's are the same set.
+  for (const std::string& name : def.keptDistinct) {
+    const FieldDef* f = FindField(def, name);
+    const bool inKey = primary != nullptr &&
+                       std::any_of(primary->fields.begin(), primary->fields.end(),
+                                   [&](const std::string& k) { return EqualsNoCase(k, name); });
+    if (f == nullptr || f->type != FieldType::Text || !inKey) {
+      throw EngineError(
+          kErrEngine,
+          "ערכי השדה '" + name + "' נשמרים רק לשדה טקסט של המפתח הראשי בטבלה '" + def.name + "'.");
+    }
+  }
   return primary;
 }
 
@@ -144,6 +157,12 @@ std::vector<std::string> TableDdl(const TableDef& def, const IndexDef* primary) 
     }
     sql += ")";
     statements.push_back(std::move(sql));
+  }
+  for (const std::string& name : def.keptDistinct) {
+    const FieldDef& f = *FindField(def, name);
+    statements.push_back("CREATE TABLE " + QuoteId(KeptDistinctTable(def.name, f.name)) + " (" +
+                         QuoteId(f.name) +
+                         " TEXT COLLATE HEBREW NOT NULL PRIMARY KEY) WITHOUT ROWID");
   }
   return statements;
 }
