@@ -9,6 +9,7 @@
 #include "control/control.h"
 #include "control/dataload.h"
 #include "output/output.h"
+#include "select/select.h"
 #include "workdb/engine.h"
 #include "workdb/schema.h"
 #include "workdb/worklock.h"
@@ -98,11 +99,16 @@ static std::string WithCounts(std::string_view status, const PreflightResult& r)
   return std::string(status) + ". " + PreflightCounts(r);
 }
 
-void Control::RunPostILChecks() {
+db::Snapshot Control::RunPostILChecks() {
   preflight_ = {};
   ui_.SetStatus("בודק את הנמענים");
-  preflight_ = RunPreflight(state_.workDbPath, postIL_.FileFormat, panel_, docTypes_,
-                            state_.selectDbPath, ui_);
+  // The dispatch file reads the same rows again, so the statement runs once for both.
+  db::Snapshot recipients =
+      db::Database::Open(state_.workDbPath)
+          .OpenSnapshot(BuildRecipientsStatement(panel_, docTypes_, state_.selectDbPath),
+                        db::SnapshotKind::Forward);
+  preflight_ = RunPreflight(recipients, postIL_.FileFormat, panel_, docTypes_, ui_);
+  return recipients;
 }
 
 // The dispatch file. The workbook named by FilePath is checked before anything is loaded,
@@ -127,15 +133,15 @@ std::string Control::CmdBuildPostIL(bool strict) {
     FailureWatch watch(ui_);
     zdr::ReadAllData(false, panel_, state_, docTypes_, watch);
     ui_.YieldToEvents();
-    RunPostILChecks();
+    db::Snapshot recipients = RunPostILChecks();
     if (strict && preflight_.errors > 0) {
       ui_.SetStatus(WithCounts("הקובץ לא נכתב", preflight_));
       return "";
     }
     ui_.SetStatus("מכין קובץ");
     const std::string csv = TempFile("zdpost1.csv");
-    CreateCSV(csv, state_.workDbPath, postIL_.FileFormat, panel_, docTypes_, state_.selectDbPath,
-              postIL_, watch);
+    CreateCSV(csv, recipients, postIL_.FileFormat, postIL_, watch);
+    recipients.Close();
     if (watch.failed()) {
       throw CommandError("הקובץ " + postIL_.FilePath +
                          " לא נכתב מחדש, כי קריאת הנתונים לא הושלמה (ראו את ההודעה הקודמת)");

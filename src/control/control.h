@@ -13,6 +13,7 @@
 #include "import/doctypes.h"
 #include "output/outputdefs.h"
 #include "output/preflight.h"
+#include "workdb/engine.h"
 
 namespace zdr {
 
@@ -95,8 +96,9 @@ class Control {
   UserSeam& ui() { return ui_; }
 
  private:
-  // The data load's rows through RunPreflight into preflight_.
-  void RunPostILChecks();
+  // The recipients through RunPreflight into preflight_. Returns them, open, for the
+  // dispatch file to read again.
+  db::Snapshot RunPostILChecks();
 
   SettingsStore& store_;
   UserSeam& ui_;

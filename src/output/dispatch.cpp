@@ -123,6 +123,10 @@ void AppendCourierRow(const db::Snapshot& rs, const DispatchFields& c, const std
   AppendCsvField(rs.Field(c.details), kCourierLengths.remarks, line);
 }
 
+// The rows of `rs` from where it stands, with the header, into `f`, which it closes.
+void WriteCSV(output_internal::CodePageFile& f, db::Snapshot& rs, int16_t pFileFormat,
+              const PostILSettings& settings, UserSeam& ui, Date today);
+
 }  // namespace
 
 void CreateCSV(const std::string& pFileName, const std::string& pDBFile, int16_t pFileFormat,
@@ -130,10 +134,24 @@ void CreateCSV(const std::string& pFileName, const std::string& pDBFile, int16_t
                const PostILSettings& settings, UserSeam& ui, Date today) {
   output_internal::CodePageFile f(pFileName, output_internal::Unmappable::kFail);
   ProgressReporter started(ui, 1);
-
   db::Database database = db::Database::Open(pDBFile);
   db::Snapshot rs = database.OpenSnapshot(BuildRecipientsStatement(panel, docTypes, selectDbPath),
                                           db::SnapshotKind::Forward);
+  WriteCSV(f, rs, pFileFormat, settings, ui, today);
+}
+
+void CreateCSV(const std::string& pFileName, db::Snapshot& recipients, int16_t pFileFormat,
+               const PostILSettings& settings, UserSeam& ui, Date today) {
+  output_internal::CodePageFile f(pFileName, output_internal::Unmappable::kFail);
+  ProgressReporter started(ui, 1);
+  if (recipients.TotalRows() > 0) recipients.MoveFirst();
+  WriteCSV(f, recipients, pFileFormat, settings, ui, today);
+}
+
+namespace {
+
+void WriteCSV(output_internal::CodePageFile& f, db::Snapshot& rs, int16_t pFileFormat,
+              const PostILSettings& settings, UserSeam& ui, Date today) {
   if (rs.AtStart() || rs.AtEnd()) {  // either, right after opening: no rows
     f.Close();                       // no recipients: an empty file, not even a header
     return;
@@ -170,5 +188,7 @@ void CreateCSV(const std::string& pFileName, const std::string& pDBFile, int16_t
   }
   f.Close();
 }
+
+}  // namespace
 
 }  // namespace zdr

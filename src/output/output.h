@@ -75,6 +75,11 @@ void CreateHTML(const std::string& pFileName, const std::string& pDBFile, const 
 void CreateCSV(const std::string& pFileName, const std::string& pDBFile, int16_t pFileFormat,
                const Panel& panel, const DocTypeTable& docTypes, const std::string& selectDbPath,
                const PostILSettings& settings, UserSeam& ui, Date today = Today());
+// The same file from `recipients`, the rows of the recipients statement (BuildRecipientsStatement),
+// read from the first row to the end: for a caller that has the rows open already, e.g. for
+// the dispatch checks.
+void CreateCSV(const std::string& pFileName, db::Snapshot& recipients, int16_t pFileFormat,
+               const PostILSettings& settings, UserSeam& ui, Date today = Today());
 
 // The lengths, in characters, the dispatch file cuts its text fields to; 0: not cut.
 struct DispatchLengths {

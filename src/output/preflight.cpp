@@ -241,17 +241,34 @@ std::string_view SeverityText(Severity s) {
   return s == Severity::kError ? "שגיאה" : "אזהרה";
 }
 
+namespace {
+// The checks over the rows of `rs` from where it stands.
+PreflightResult CheckRows(db::Snapshot& rs, int16_t pFileFormat, bool zipCarried, UserSeam& ui);
+}  // namespace
+
 PreflightResult RunPreflight(const std::string& pDBFile, int16_t pFileFormat, const Panel& panel,
                              const DocTypeTable& docTypes, const std::string& selectDbPath,
                              UserSeam& ui) {
-  PreflightResult result;
   ProgressReporter started(ui, 1);
-  if (pFileFormat != 0 && pFileFormat != 1) return result;  // CreateCSV writes no rows
-  const bool zipCarried = !AddressFromDocumentHeader(panel, docTypes);
-
+  if (pFileFormat != 0 && pFileFormat != 1) return {};  // CreateCSV writes no rows
   db::Database database = db::Database::Open(pDBFile);
   db::Snapshot rs = database.OpenSnapshot(BuildRecipientsStatement(panel, docTypes, selectDbPath),
                                           db::SnapshotKind::Forward);
+  return CheckRows(rs, pFileFormat, !AddressFromDocumentHeader(panel, docTypes), ui);
+}
+
+PreflightResult RunPreflight(db::Snapshot& recipients, int16_t pFileFormat, const Panel& panel,
+                             const DocTypeTable& docTypes, UserSeam& ui) {
+  ProgressReporter started(ui, 1);
+  if (pFileFormat != 0 && pFileFormat != 1) return {};
+  if (recipients.TotalRows() > 0) recipients.MoveFirst();
+  return CheckRows(recipients, pFileFormat, !AddressFromDocumentHeader(panel, docTypes), ui);
+}
+
+namespace {
+
+PreflightResult CheckRows(db::Snapshot& rs, int16_t pFileFormat, bool zipCarried, UserSeam& ui) {
+  PreflightResult result;
   if (rs.AtStart() || rs.AtEnd()) return result;
   const int64_t count = rs.TotalRows();
   const RowFields fields(rs);
@@ -265,6 +282,8 @@ PreflightResult RunPreflight(const std::string& pDBFile, int16_t pFileFormat, co
   }
   return result;
 }
+
+}  // namespace
 
 std::array<std::string, 6> FindingCells(const Finding& f) {
   return {std::string(SeverityText(f.severity)),

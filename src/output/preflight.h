@@ -26,6 +26,10 @@
 #include "control/userseam.h"
 #include "import/doctypes.h"
 
+namespace zdr::db {
+class Snapshot;
+}
+
 namespace zdr {
 
 // error: the post refuses the row (or the file cannot be written); warning: the row goes
@@ -116,6 +120,10 @@ struct PreflightResult {
 PreflightResult RunPreflight(const std::string& pDBFile, int16_t pFileFormat, const Panel& panel,
                              const DocTypeTable& docTypes, const std::string& selectDbPath,
                              UserSeam& ui);
+// The same checks over `recipients`, the rows of the recipients statement, read from the
+// first row to the end; the caller may read them again (MoveFirst) for the dispatch file.
+PreflightResult RunPreflight(db::Snapshot& recipients, int16_t pFileFormat, const Panel& panel,
+                             const DocTypeTable& docTypes, UserSeam& ui);
 
 // The findings sheet's and the findings CSV's column headings, in order.
 inline constexpr std::array<std::string_view, 6> kFindingHeadings{"חומרה", "שורה", "מפתח חשבון",
