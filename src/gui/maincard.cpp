@@ -15,7 +15,12 @@
 #include <exception>
 
 #include "control/settings.h"
-#include "gui/dialogs.h"
+#include "gui/labeldefdialog.h"
+#include "gui/logondialog.h"
+#include "gui/opendirdialog.h"
+#include "gui/postdialog.h"
+#include "gui/selectcarddialog.h"
+#include "gui/widgets.h"
 #include "import/importers.h"
 #include "output/output.h"
 #include "select/select.h"

@@ -16,7 +16,11 @@
 
 #include "control/qtsettings.h"
 #include "control/settings.h"
-#include "gui/dialogs.h"
+#include "gui/labeldefdialog.h"
+#include "gui/logondialog.h"
+#include "gui/opendirdialog.h"
+#include "gui/postdialog.h"
+#include "gui/selectcarddialog.h"
 #include "gui/maincard.h"
 #include "gui/qtseam.h"
 

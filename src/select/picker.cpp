@@ -1,5 +1,9 @@
 #include "select/picker.h"
 
+#include <variant>
+
+#include "workdb/engine.h"
+
 namespace zdr {
 
 std::string BuildPickerSQL(std::string& pFilter, bool pMarkedOnly, int16_t pickerSortIndex) {
@@ -56,6 +60,47 @@ std::string BuildSetIncludeSQL(std::string_view sortByKey, bool include) {
   sql += " Where SortByKey = ";
   sql += QuoteJetText(sortByKey);
   return sql;
+}
+
+namespace {
+
+std::string TextOf(const db::Value& v) {
+  if (const auto* s = std::get_if<std::string>(&v)) return *s;
+  return {};
+}
+
+bool TrueOf(const db::Value& v) {
+  if (const auto* i = std::get_if<int64_t>(&v)) return *i != 0;
+  if (const auto* d = std::get_if<double>(&v)) return *d != 0;
+  return false;
+}
+
+db::Database OpenSelection(const std::string& dbPath) {
+  // Before the first scan there is no database to open.
+  if (dbPath.empty()) throw db::EngineError(db::kErrCannotOpen, "לא נוצר בסיס נתוני הבחירה");
+  return db::Database::Open(dbPath);
+}
+
+}  // namespace
+
+std::vector<PickerRow> ReadPickerRows(const std::string& dbPath, std::string_view recordSource) {
+  db::Database database = OpenSelection(dbPath);
+  db::Snapshot snap = database.OpenSnapshot(recordSource);
+  const int key = snap.FieldIndex("SortByKey");
+  const int name = snap.FieldIndex("SortByName");
+  const int include = snap.FieldIndex("Include");
+  std::vector<PickerRow> rows;
+  if (!snap.AtEnd()) snap.MoveFirst();
+  while (!snap.AtEnd()) {
+    rows.push_back(
+        {TextOf(snap.Field(key)), TextOf(snap.Field(name)), TrueOf(snap.Field(include))});
+    snap.MoveNext();
+  }
+  return rows;
+}
+
+void ExecutePickerSQL(const std::string& dbPath, std::string_view jetSql) {
+  OpenSelection(dbPath).Execute(jetSql);
 }
 
 }  // namespace zdr

@@ -1,10 +1,12 @@
-// The account picker's statements over tSelectAccount of the account-selection database.
-// Pure functions: they build Jet SQL text and touch no database.
+// The account picker's statements over tSelectAccount of the account-selection database,
+// and the two calls that run them there. The statements are pure functions of their
+// arguments; only ReadPickerRows and ExecutePickerSQL touch the database.
 #pragma once
 
 #include <cstdint>
 #include <string>
 #include <string_view>
+#include <vector>
 
 namespace zdr {
 
@@ -30,5 +32,21 @@ inline constexpr std::string_view kMarkAllSQL =
     "Update tSelectAccount Set Include = True Where Include = False";
 inline constexpr std::string_view kUnmarkAllSQL =
     "Update tSelectAccount Set Include = False Where Include = True";
+
+// One account of the picker.
+struct PickerRow {
+  std::string key;   // SortByKey
+  std::string name;  // SortByName
+  bool include = false;
+};
+
+// The rows of `recordSource` (a statement of BuildPickerSQL) in the account-selection
+// database at `dbPath`, opened for this call alone. Throws the engine's error when the
+// database or the statement fails; an empty path is such a failure.
+std::vector<PickerRow> ReadPickerRows(const std::string& dbPath, std::string_view recordSource);
+
+// Runs a statement that changes rows (a tick, mark all) on the account-selection database
+// at `dbPath`, opened for this call alone. Throws as ReadPickerRows does.
+void ExecutePickerSQL(const std::string& dbPath, std::string_view jetSql);
 
 }  // namespace zdr
