@@ -19,7 +19,7 @@ trap 'rm -rf "$work"' EXIT
   --documents 20 --ledger 20 --receipts 10 >/dev/null
 export Temp="$work"
 export QT_QPA_PLATFORM=offscreen
-"$build/src/zdrlab" --screenshots "$docs" --company "$work/companies/company1"
+"$build/tools/zdrshots" "$docs" --company "$work/companies/company1"
 
 bash "$(dirname "$0")/demo.sh" "$build" "$work/demo-sample" "$work/demo-out" >/dev/null
 chromium=(chromium --headless --no-sandbox --disable-gpu --disable-background-networking

@@ -39,7 +39,7 @@ int main(int argc, char** argv) {
     zdr::QtSettingsStore store;
     return zdr::RunCli(args, store);
   }
-  std::string company, screenshots;
+  std::string company;
   for (size_t i = 0; i < args.size(); ++i) {
     if (args[i] == "--help" || args[i] == "-h") {
       zdr::QtSettingsStore store;
@@ -49,8 +49,6 @@ int main(int argc, char** argv) {
     }
     if (args[i] == "--company" && i + 1 < args.size()) {
       company = args[++i];
-    } else if (args[i] == "--screenshots" && i + 1 < args.size()) {
-      screenshots = args[++i];
     } else {
       std::fprintf(stderr, "zdrlab: unknown option %s (see zdrlab --help)\n", args[i].c_str());
       return 2;
@@ -64,7 +62,6 @@ int main(int argc, char** argv) {
         stderr);
     return 1;
   }
-  if (!screenshots.empty()) return zdr::gui::RenderScreenshots(argc, argv, screenshots, company);
   return zdr::gui::RunMainWindow(argc, argv, company);
 #else
   std::fputs("zdrlab was built without its window; give a command (labels, list, post).\n", stderr);

@@ -2,7 +2,10 @@
 // the user's own settings store.
 #pragma once
 
+#include <QString>
 #include <string>
+
+class QApplication;
 
 namespace zdr::gui {
 
@@ -11,13 +14,11 @@ namespace zdr::gui {
 // the stored one (the stored setting is left as it is).
 int RunMainWindow(int& argc, char** argv, const std::string& companyOverride);
 
-// Renders the panel and each dialog offscreen into PNG files in `outDir` (created when
-// missing): panel.png, frmLogon.png, frmOpenDir.png, frmLabDef.png, frmSelectCard.png,
-// frmPostIL.png, and fileChooser.png (the file chooser of the settings dialogs). Uses a settings
-// store in memory, so the user's settings are neither read nor changed. A non-empty
-// `companyOverride` is the company the panel and the picker show; the company chooser shows the
-// folder that holds it. Returns 0 when every file was written.
-int RenderScreenshots(int& argc, char** argv, const std::string& outDir,
-                      const std::string& companyOverride);
+// Sets `app` up as the window runs it: its names, right to left, the Hebrew font and Qt's
+// own texts in Hebrew.
+void SetUpApplication(QApplication& app);
+
+// The window's title.
+QString WindowTitle();
 
 }  // namespace zdr::gui
