@@ -185,7 +185,43 @@ MainCard::MainCard(SettingsStore& store, MainCardServices services, QWidget* par
 MainCard::~MainCard() = default;
 
 void MainCard::BuildLayout() {
-  // Accounts.
+  QGroupBox* accounts = BuildAccounts();
+  QGroupBox* documents = BuildDocuments();
+  QGroupBox* ledger = BuildLedger();
+  QGroupBox* layoutBox = BuildLabelLayout();
+  const auto [outputs, settings] = BuildCommands();
+
+  // Status line and progress bar.
+  lblMessage_->setMinimumHeight(24);
+  lblMessage_->setFrameShape(QFrame::StyledPanel);
+  lblMessage_->setFrameShadow(QFrame::Sunken);
+  progress_->setTextVisible(false);
+  progress_->setMaximumHeight(14);
+
+  auto* right = new QVBoxLayout;
+  right->addWidget(accounts);
+  right->addWidget(documents);
+  right->addStretch(1);
+  auto* left = new QVBoxLayout;
+  left->addWidget(ledger);
+  left->addWidget(layoutBox);
+  left->addStretch(1);
+  auto* columns = new QHBoxLayout;
+  columns->addLayout(right, 1);
+  columns->addLayout(left, 1);
+
+  inputGroups_ = {accounts, documents, ledger, layoutBox};
+  SetTabOrder();
+
+  auto* all = new QVBoxLayout(this);
+  all->addLayout(columns, 1);
+  all->addLayout(outputs);
+  all->addLayout(settings);
+  all->addWidget(lblMessage_);
+  all->addWidget(progress_);
+}
+
+QGroupBox* MainCard::BuildAccounts() {
   auto* accounts = new QGroupBox(QStringLiteral("טווח הכרטיסים:"), this);
   auto* ga = new QGridLayout(accounts);
   RangeRow(ga, 0, Check("ChkAccKey", QStringLiteral("מכרטיס:"), &Panel::ChkAccKey),
@@ -230,8 +266,10 @@ void MainCard::BuildLayout() {
   }
   ga->setColumnStretch(1, 1);
   ga->setColumnStretch(3, 1);
+  return accounts;
+}
 
-  // Documents.
+QGroupBox* MainCard::BuildDocuments() {
   auto* documents = new QGroupBox(QStringLiteral("מסמכים"), this);
   auto* gd = new QGridLayout(documents);
   {
@@ -275,8 +313,10 @@ void MainCard::BuildLayout() {
   lblToRef->SetOnClick([this] { lblToRef_Click(); });
   label48->SetOnClick([this] { Label48_Click(); });
   label45->SetOnClick([this] { Label45_Click(); });
+  return documents;
+}
 
-  // Ledger.
+QGroupBox* MainCard::BuildLedger() {
   auto* ledger = new QGroupBox(QStringLiteral("לפי טווח תנועות הנהלת חשבונות:"), this);
   auto* gl = new QGridLayout(ledger);
   RangeRow(gl, 0, Check("ChkJournal", QStringLiteral("ממנה:"), &Panel::ChkJournal),
@@ -295,8 +335,10 @@ void MainCard::BuildLayout() {
       1, 4);
   gl->setColumnStretch(1, 1);
   gl->setColumnStretch(3, 1);
+  return ledger;
+}
 
-  // Order and label layout.
+QGroupBox* MainCard::BuildLabelLayout() {
   auto* layoutBox = new QGroupBox(QStringLiteral("מיון ומבנה המדבקות"), this);
   auto* gm = new QGridLayout(layoutBox);
   {
@@ -337,26 +379,29 @@ void MainCard::BuildLayout() {
     gm->addWidget(Caption(QStringLiteral("עותקים:"), this), 2, 0);
     gm->addLayout(more, 2, 1);
   }
-  {
-    auto* content = new QGroupBox(QStringLiteral("תוכן המדבקה: (סמן את השורות הרצויות)"), this);
-    auto* gc = new QGridLayout(content);
-    static const std::array<const char*, 9> kTitleCaptions{"לכבוד",         "שם כרטיס", "קוד כרטיס",
-                                                           "לידי: איש קשר", "כתובת",    "עיר",
-                                                           "שכונה",         "טלפון",    "מיקוד"};
-    for (int i = 0; i < 9; ++i) {
-      const std::string name = "ChkTitle" + std::to_string(i);
-      chkTitle_[i] = Check(name.c_str(), ToQ(kTitleCaptions[i]), nullptr);
-      gc->addWidget(chkTitle_[i], i / 3, i % 3);
-    }
-    chkLogo_[0] = Check("ChkLogo0", QStringLiteral("תמונה עליונה"), nullptr);
-    chkLogo_[1] = Check("ChkLogo1", QStringLiteral("תמונה תחתונה"), nullptr);
-    gc->addWidget(chkLogo_[0], 3, 0);
-    gc->addWidget(chkLogo_[1], 3, 1);
-    gm->addWidget(content, 3, 0, 1, 2);
-  }
+  gm->addWidget(BuildLabelContent(), 3, 0, 1, 2);
   gm->setColumnStretch(1, 1);
+  return layoutBox;
+}
 
-  // Commands.
+QGroupBox* MainCard::BuildLabelContent() {
+  auto* content = new QGroupBox(QStringLiteral("תוכן המדבקה: (סמן את השורות הרצויות)"), this);
+  auto* gc = new QGridLayout(content);
+  static const std::array<const char*, 9> kTitleCaptions{
+      "לכבוד", "שם כרטיס", "קוד כרטיס", "לידי: איש קשר", "כתובת", "עיר", "שכונה", "טלפון", "מיקוד"};
+  for (int i = 0; i < 9; ++i) {
+    const std::string name = "ChkTitle" + std::to_string(i);
+    chkTitle_[i] = Check(name.c_str(), ToQ(kTitleCaptions[i]), nullptr);
+    gc->addWidget(chkTitle_[i], i / 3, i % 3);
+  }
+  chkLogo_[0] = Check("ChkLogo0", QStringLiteral("תמונה עליונה"), nullptr);
+  chkLogo_[1] = Check("ChkLogo1", QStringLiteral("תמונה תחתונה"), nullptr);
+  gc->addWidget(chkLogo_[0], 3, 0);
+  gc->addWidget(chkLogo_[1], 3, 1);
+  return content;
+}
+
+std::pair<QHBoxLayout*, QHBoxLayout*> MainCard::BuildCommands() {
   auto* labPrev = Command("CmdLabPrev", QStringLiteral("הצג מדבקות"));
   auto* preview = Command("CmdPreview", QStringLiteral("הצג רשימה"));
   auto* buildPost = Command("cmdBuildPostIL", QStringLiteral("הכן קובץ לדואר"));
@@ -380,35 +425,7 @@ void MainCard::BuildLayout() {
   connect(labDef, &QPushButton::clicked, this, [this] { CmdLabDef_Click(); });
   connect(def, &QPushButton::clicked, this, [this] { CmdDef_Click(); });
   connect(connectButton, &QPushButton::clicked, this, [this] { CmdConnect_Click(); });
-
-  // Status line and progress bar.
-  lblMessage_->setMinimumHeight(24);
-  lblMessage_->setFrameShape(QFrame::StyledPanel);
-  lblMessage_->setFrameShadow(QFrame::Sunken);
-  progress_->setTextVisible(false);
-  progress_->setMaximumHeight(14);
-
-  auto* right = new QVBoxLayout;
-  right->addWidget(accounts);
-  right->addWidget(documents);
-  right->addStretch(1);
-  auto* left = new QVBoxLayout;
-  left->addWidget(ledger);
-  left->addWidget(layoutBox);
-  left->addStretch(1);
-  auto* columns = new QHBoxLayout;
-  columns->addLayout(right, 1);
-  columns->addLayout(left, 1);
-
-  inputGroups_ = {accounts, documents, ledger, layoutBox};
-  SetTabOrder();
-
-  auto* all = new QVBoxLayout(this);
-  all->addLayout(columns, 1);
-  all->addLayout(outputs);
-  all->addLayout(settings);
-  all->addWidget(lblMessage_);
-  all->addWidget(progress_);
+  return {outputs, settings};
 }
 
 void MainCard::SetTabOrder() {

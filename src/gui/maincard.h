@@ -14,6 +14,7 @@
 #include <functional>
 #include <memory>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "control/control.h"
@@ -22,6 +23,7 @@
 
 class QComboBox;
 class QGroupBox;
+class QHBoxLayout;
 class QLabel;
 class QLineEdit;
 class QProgressBar;
@@ -146,7 +148,17 @@ class MainCard : public QWidget {
   QComboBox* List(const char* name, int Panel::*field);
   QPushButton* Command(const char* name, const QString& caption);
 
+  // The panel: its four groups of inputs in two columns, the two rows of commands, the
+  // status line and the progress bar.
   void BuildLayout();
+  QGroupBox* BuildAccounts();
+  QGroupBox* BuildDocuments();
+  QGroupBox* BuildLedger();
+  // The order and the label layout, holding the label's content (BuildLabelContent).
+  QGroupBox* BuildLabelLayout();
+  QGroupBox* BuildLabelContent();
+  // The row of the output commands and the row of the settings commands.
+  std::pair<QHBoxLayout*, QHBoxLayout*> BuildCommands();
   void SetTabOrder();
   // Runs an output command with the panel locked meanwhile: its inputs greyed and every
   // command refused.
