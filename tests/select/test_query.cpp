@@ -1,5 +1,6 @@
-// The recipients statement as text: the WHERE clause, the column list, the ORDER BY clause
-// and how the outputs assemble them. What the statement selects is in test_selection_rows.
+// The recipients statement as text: the WHERE clause, the column list and how the outputs
+// assemble the pieces. What the statement selects, and in which order, is checked on real
+// rows in test_selection_rows.
 
 #include <gtest/gtest.h>
 
@@ -147,45 +148,6 @@ TEST(SelectTest, ColumnsFromTheHeaderOnlyForIssuedStockDocumentsAddressedFromIt)
     EXPECT_THROW(BuildSelect(panel, docTypes, 0, useDocs), std::out_of_range);
     EXPECT_THROW(BuildOrderBy(panel, docTypes, useDocs), std::out_of_range);
     EXPECT_THROW(BuildRecipientsStatement(panel, docTypes, ""), std::out_of_range);
-  }
-}
-
-// The first column with its direction, then the second column, which always ascends.
-TEST(OrderByTest, EverySortEntryOnBothVariants) {
-  struct Case {
-    int sortBy, sortDir;
-    const char* accountOrder;
-    const char* documentOrder;  // documents used, address from the header
-  };
-  const Case cases[] = {
-      {0, 0, "tAccount.SortByKey ASC", "tAccount.SortByKey ASC"},
-      {1, 1, "tAccount.SortByName DESC", "tStockHead.SortByName DESC"},
-      {2, 1, "tAccount.SortByCity DESC, tAccount.SortByName",
-       "tStockHead.SortByCity DESC, tStockHead.SortByName"},
-      {3, 0, "tAccount.SortByZip ASC, tAccount.SortByName",
-       "tStockHead.SortByZip ASC, tStockHead.SortByName"},
-      {4, -1, "tAccount.Telephone , tAccount.SortByName",
-       "tAccount.Telephone ,tStockHead.SortByName"},
-      {5, 0, "tAccount.CategoryCode ASC, tAccount.SortByName",
-       "tAccount.CategoryCode ASC,tStockHead.SortByName"},
-      {6, 2, "tAccount.SortByKeyVal ", "tAccount.SortByKeyVal "},
-      {7, 1, "tAccount.CategoryCode DESC, tAccount.SortByName",
-       "tStockHead.Reference1 DESC,tStockHead.SortByName"},
-      {8, 0, "tAccount.SortByName ASC", "tStockHead.SortByName ASC"},
-      {-1, 0, "tAccount.SortByName ASC", "tStockHead.SortByName ASC"},
-  };
-  const DocTypeTable docTypes;
-  for (const Case& c : cases) {
-    Panel panel;
-    panel.CmbSortBy = c.sortBy;
-    panel.CmbSortDir = c.sortDir;
-    for (auto [addressFrom, useDocs] : {std::pair{0, false}, {0, true}, {1, true}}) {
-      panel.cmbAddressFrom = addressFrom;
-      const bool docCase = useDocs && addressFrom == 0;
-      EXPECT_EQ(BuildOrderBy(panel, docTypes, useDocs),
-                std::string(" ORDER BY ") + (docCase ? c.documentOrder : c.accountOrder))
-          << c.sortBy;
-    }
   }
 }
 

@@ -1,11 +1,10 @@
 // The statements the system runs, on real databases made by CreateWorkDB and CreateSelectDB:
-// the marks the updates leave, the picker's rows, and the rows the fields and indexes refuse.
-// The recipients statement itself runs in test_selection_rows.
+// the marks the updates leave, the picker's rows, the criteria's subqueries, and the rows the
+// fields and indexes refuse. The recipients statement as a whole runs in test_selection_rows.
 #include <gtest/gtest.h>
 
 #include <optional>
 #include <string>
-#include <utility>
 #include <vector>
 
 #include "support/recordingseam.h"
@@ -17,29 +16,12 @@ namespace zdr {
 namespace {
 
 using namespace test;  // the statement pieces
-using db::Value;
-using Row = std::vector<std::pair<const char*, Value>>;
 using Keys = std::vector<std::string>;
 
-Value T(const char* s) {
-  return std::string(s);
-}
-Value I(int64_t v) {
-  return v;
-}
-
-void Insert(db::Database& d, const std::string& table, const Row& row) {
-  db::TableRecordset rs = d.OpenTable(table);
-  rs.AddNew();
-  for (const auto& [name, value] : row) rs.Set(name, value);
-  rs.Update();
-  rs.Close();
-}
-
-// The number of the engine error that inserting `row` raises, or 0.
-int InsertError(db::Database& d, const std::string& table, const Row& row) {
+// The number of the engine error a statement raises, or 0.
+int ErrorOf(db::Database& d, const std::string& jet) {
   try {
-    Insert(d, table, row);
+    d.Execute(jet);
   } catch (const db::EngineError& e) {
     return e.number();
   }
@@ -50,14 +32,10 @@ int InsertError(db::Database& d, const std::string& table, const Row& row) {
 Keys Column(db::Database& d, const std::string& jet, const char* field) {
   Keys out;
   for (db::Snapshot rs = d.OpenSnapshot(jet); !rs.AtEnd(); rs.MoveNext()) {
-    const Value v = rs.Field(field);
-    if (db::IsNull(v)) {
-      out.push_back("NULL");
-    } else if (const auto* s = std::get_if<std::string>(&v)) {
-      out.push_back(*s);
-    } else {
-      out.push_back(std::to_string(std::get<int64_t>(v)));
-    }
+    const db::Value v = rs.Field(field);
+    out.push_back(db::IsNull(v)                        ? "NULL"
+                  : std::holds_alternative<int64_t>(v) ? std::to_string(std::get<int64_t>(v))
+                                                       : std::get<std::string>(v));
   }
   return out;
 }
@@ -67,34 +45,28 @@ Keys Column(db::Database& d, const std::string& jet, const char* field) {
 class StatementTest : public ::testing::Test {
  protected:
   void SetUp() override {
-    selectPath_ = CreateSelectDB(ui_);
-    work_.emplace(db::Database::Open(CreateWorkDB(selectPath_, ui_)));
-    select_.emplace(db::Database::Open(selectPath_));
+    select_.emplace(db::Database::Open(CreateSelectDB(ui_)));
+    work_.emplace(db::Database::Open(CreateWorkDB(select_->Path().string(), ui_)));
     ASSERT_TRUE(ui_.messages.empty());
-    const struct {
-      const char *key, *name;
-      bool picked;
-    } accounts[] = {{"100", "כהן משה", true}, {"20", "לוי דוד", false}, {"3", "סמית ג'ון", false},
-                    {"40", "אברהם", true},    {"5", "צבי", false},      {"6", "ג'ון כהן", false}};
-    for (const auto& a : accounts) {
-      const Value sortKey = std::string(5 - std::string(a.key).size(), ' ') + a.key;
-      Insert(*work_, "tAccount",
-             {{"AccountKey", T(a.key)}, {"AccountName", T(a.name)}, {"SortByKey", sortKey}});
-      Insert(*select_, "tSelectAccount",
-             {{"AccountKey", T(a.key)},
-              {"SortByKey", sortKey},
-              {"SortByName", T(a.name)},
-              {"Include", I(a.picked ? -1 : 0)}});
+    const char* accounts[][3] = {{"100", "כהן משה", "True"},   {"20", "לוי דוד", "False"},
+                                 {"3", "סמית ג''ון", "False"}, {"40", "אברהם", "True"},
+                                 {"5", "צבי", "False"},        {"6", "ג''ון כהן", "False"}};
+    for (const auto& [key, name, picked] : accounts) {
+      const std::string sortKey = std::string(5 - std::string(key).size(), ' ') + key;
+      const std::string values = "VALUES ('" + std::string(key) + "', '" + sortKey + "', '" + name;
+      work_->Execute("INSERT INTO tAccount (AccountKey, SortByKey, AccountName) " + values + "')");
+      select_->Execute("INSERT INTO tSelectAccount (AccountKey, SortByKey, SortByName, Include) " +
+                       values + "', " + picked + ")");
     }
-    for (auto [file, head] : {std::pair{1, 1}, {1, 2}, {1, 3}, {2, 1}}) {
-      Insert(*work_, "tStockHead",
-             {{"CompID", I(1)}, {"TavFileID", I(file)}, {"HeadIndx", I(head)}, {"Include", I(-1)}});
-    }
-    Insert(*work_, "tCash", {{"TransID", I(3)}, {"AccountKey", T("5")}});
-    Insert(*work_, "tTransact", {{"FileID", I(-1)}, {"TransID", I(1)}, {"AccountKey", T("6")}});
+    work_->Execute(
+        "INSERT INTO tStockHead (CompID, TavFileID, HeadIndx, AccountKey, Include) VALUES "
+        "(1, 1, 1, '20', True), (1, 1, 2, '3', True), (1, 1, 3, '5', False), (1, 2, 1, '40', "
+        "True)");
+    work_->Execute("INSERT INTO tCash (TransID, AccountKey) VALUES (3, '5')");
+    work_->Execute("INSERT INTO tTransact (FileID, TransID, AccountKey) VALUES (-1, 1, '6')");
   }
 
-  Keys Recipients(const std::string& from, const std::string& criteria) {
+  Keys Recipients(const std::string& criteria, const char* from = " FROM tAccount") {
     return Column(*work_,
                   std::string(kAccountColumns) + from + kWhere + criteria +
                       " ORDER BY tAccount.SortByKey ASC",
@@ -103,117 +75,84 @@ class StatementTest : public ::testing::Test {
 
   ScratchTemp temp_;
   RecordingSeam ui_;
-  std::string selectPath_;
-  std::optional<db::Database> work_, select_;
+  std::optional<db::Database> select_, work_;
 };
 
 TEST_F(StatementTest, HeadersMarkedByTheirChosenItemsOnce) {
-  const std::tuple<int, int, const char*> lines[] = {
-      {1, 1, "A"}, {1, 1, "B"}, {1, 2, "Z"}, {1, 3, "B"}, {2, 1, "Z"}};
-  int lineNo = 0;
-  for (const auto& [file, head, item] : lines) {
-    Insert(*work_, "tStockLine",
-           {{"CompID", I(1)},
-            {"TavFileID", I(file)},
-            {"HeadIndx", I(head)},
-            {"LineIndx", I(++lineNo)},
-            {"ItemKey", T(item)}});
-  }
+  work_->Execute(
+      "INSERT INTO tStockLine (CompID, TavFileID, HeadIndx, LineIndx, ItemKey) VALUES "
+      "(1, 1, 1, 1, 'A'), (1, 1, 1, 2, 'B'), (1, 1, 2, 3, 'Z'), (1, 1, 3, 4, 'B'), (1, 2, 1, 5, "
+      "'Z')");
   const char* marks = "SELECT Include FROM tStockHead ORDER BY TavFileID, HeadIndx";
   work_->Execute(kClearHeaders);
   EXPECT_EQ(work_->Execute(kMarkHeadersByItem), 0);  // no item chosen yet
   EXPECT_EQ(Column(*work_, marks, "Include"), (Keys{"0", "0", "0", "0"}));
-  Insert(*work_, "tItem", {{"ItemKey", T("A")}});
-  Insert(*work_, "tItem", {{"ItemKey", T("B")}});
+  work_->Execute("INSERT INTO tItem (ItemKey) VALUES ('A'), ('B')");
   EXPECT_EQ(Column(*work_, "SELECT * FROM qHeadByItem ORDER BY TavFileID, HeadIndx", "HeadIndx"),
             (Keys{"1", "3"}));
   EXPECT_EQ(work_->Execute(kMarkHeadersByItem), 2);
   EXPECT_EQ(Column(*work_, marks, "Include"), (Keys{"-1", "0", "-1", "0"}));
 }
 
-TEST_F(StatementTest, PickerRowsAndTheLinkToThem) {
-  const std::string base =
-      "Select SortByKey, SortByName, Include From tSelectAccount Where SortByKey > ''";
+TEST_F(StatementTest, PickerRowsAndTheCriteriaThroughTheLink) {
   // The filter goes in with its own Or: the names that match plus every ticked account.
   EXPECT_EQ(Column(*select_,
-                   base + " And SortByName Like '*ג''ון*' Or Include = True Order By SortByName",
+                   "Select SortByKey, SortByName, Include From tSelectAccount Where SortByKey > "
+                   "'' And SortByName Like '*ג''ון*' Or Include = True Order By SortByName",
                    "SortByName"),
             (Keys{"אברהם", "ג'ון כהן", "כהן משה", "סמית ג'ון"}));
-  EXPECT_EQ(select_->Execute("Update tSelectAccount Set Include = True Where Include = False"), 4);
-  EXPECT_EQ(select_->Execute("Update tSelectAccount Set Include = False Where Include = True"), 6);
+  EXPECT_EQ(Recipients(kPicked), (Keys{"40", "100"}));
+  EXPECT_EQ(Recipients(kNotPicked), (Keys{"3", "5", "6", "20"}));
+  EXPECT_EQ(Recipients(kCashIn), Keys{"5"});
+  EXPECT_EQ(Recipients(kLedger), Keys{"6"});
+  EXPECT_EQ(Recipients(kNotIssued), (Keys{"5", "6", "100"}));
+  EXPECT_EQ(Recipients(kStockJoin, " FROM tAccount, tStockHead"), (Keys{"3", "20", "40"}));
+  // A joined update reads each account's own row of the other file.
+  EXPECT_EQ(work_->Execute("UPDATE tAccount INNER JOIN tSelectAccount AS S ON tAccount.AccountKey "
+                           "= S.AccountKey SET tAccount.City = S.SortByName WHERE Not S.Include"),
+            4);
+  EXPECT_EQ(Column(*work_, "SELECT City FROM tAccount WHERE AccountKey In ('3', '100')", "City"),
+            (Keys{"NULL", "סמית ג'ון"}));
   // With nothing ticked, "in the selection" matches nobody and "not in it" everybody; the
   // working database sees the change through its link.
-  EXPECT_TRUE(Recipients(" FROM tAccount", kPicked).empty());
-  EXPECT_EQ(Recipients(" FROM tAccount", kNotPicked).size(), 6u);
+  EXPECT_EQ(select_->Execute("Update tSelectAccount Set Include = False Where Include = True"), 2);
+  EXPECT_TRUE(Recipients(kPicked).empty());
+  EXPECT_EQ(Recipients(kNotPicked).size(), 6u);
 }
 
 TEST_F(StatementTest, FieldsAndIndexesRefuseWhatTheyMust) {
-  const Row line = {{"CompID", I(1)}, {"TavFileID", I(1)}, {"HeadIndx", I(1)}, {"LineIndx", I(1)}};
-  struct Case {
-    db::Database* d;
-    const char* table;
-    Row row;
-    int error;
-  };
-  const Case cases[] = {
-      {&*work_,
-       "tAccount",
-       {{"AccountKey", T("100")}, {"SortByKey", T("x")}},
-       db::kErrDuplicateKey},
-      {&*work_,
-       "tAccount",
-       {{"AccountKey", T("n")}, {"SortByKey", T("  100")}},
-       db::kErrDuplicateKey},
-      {&*work_,
-       "tStockHead",
-       {{"CompID", I(1)}, {"TavFileID", I(1)}, {"HeadIndx", I(1)}},
-       db::kErrDuplicateKey},
-      {&*work_, "tStockLine", line, 0},
-      {&*work_, "tStockLine", line, db::kErrDuplicateKey},
-      {&*work_,
-       "tTransact",
-       {{"FileID", I(-1)}, {"TransID", I(1)}, {"AccountKey", T("6")}},
-       db::kErrDuplicateKey},
-      {&*work_, "tTransact", {{"FileID", I(-1)}, {"TransID", I(1)}, {"AccountKey", T("7")}}, 0},
-      {&*work_, "tCash", {{"TransID", I(3)}, {"AccountKey", T("5")}}, db::kErrDuplicateKey},
-      {&*work_, "tItem", {{"ItemKey", T("A")}}, 0},
-      {&*work_, "tItem", {{"ItemKey", T("A")}}, db::kErrDuplicateKey},
-      {&*select_,
-       "tSelectAccount",
-       {{"AccountKey", T("100")}, {"SortByKey", T("q")}},
-       db::kErrDuplicateKey},
-      {&*select_,
-       "tSelectAccount",
-       {{"AccountKey", T("q")}, {"SortByKey", T("  100")}},
-       db::kErrDuplicateKey},
-      {&*work_, "tItem", {{"ItemKey", T("")}}, db::kErrZeroLength},
-      {&*work_,
-       "tAccount",
-       {{"AccountKey", T("n1")}, {"SortByKey", T("n1")}, {"City", T("")}},
-       db::kErrZeroLength},
-      {&*work_,
-       "tAccount",
-       {{"AccountKey", T("n2")}, {"SortByKey", T("n2")}, {"CategoryCode", T("1234")}},
-       db::kErrFieldTooSmall},
+  const std::pair<const char*, int> cases[] = {
+      {"tAccount (AccountKey, SortByKey) VALUES ('100', 'x')", db::kErrDuplicateKey},
+      {"tAccount (AccountKey, SortByKey) VALUES ('n', '  100')", db::kErrDuplicateKey},
+      {"tAccount (AccountKey, City) VALUES ('n', '')", db::kErrZeroLength},
+      {"tAccount (AccountKey, CategoryCode) VALUES ('n', '1234')", db::kErrFieldTooSmall},
       // The width counts characters: three Hebrew letters fit in Text(3).
-      {&*work_,
-       "tAccount",
-       {{"AccountKey", T("n3")}, {"SortByKey", T("n3")}, {"CategoryCode", T("אבג")}},
-       0},
-      {&*work_,
-       "tCash",
-       {{"TransID", I(9)}, {"AccountKey", T("123456789")}},
-       db::kErrFieldTooSmall},
-  };
-  for (const Case& c : cases) {
-    EXPECT_EQ(InsertError(*c.d, c.table, c.row), c.error) << c.table << " case " << (&c - cases);
+      {"tAccount (AccountKey, CategoryCode) VALUES ('n', 'אבג')", 0},
+      {"tStockHead (CompID, TavFileID, HeadIndx) VALUES (1, 1, 1)", db::kErrDuplicateKey},
+      {"tStockHead (CompID, TavFileID, HeadIndx) VALUES (1, 1, 4)", 0},
+      {"tStockLine (CompID, TavFileID, HeadIndx, LineIndx) VALUES (1, 1, 1, 1)", 0},
+      {"tStockLine (CompID, TavFileID, HeadIndx, LineIndx) VALUES (1, 1, 1, 1)",
+       db::kErrDuplicateKey},
+      {"tTransact (FileID, TransID, AccountKey) VALUES (-1, 1, '6')", db::kErrDuplicateKey},
+      {"tTransact (FileID, TransID, AccountKey) VALUES (-1, 1, '7')", 0},
+      {"tCash (TransID, AccountKey) VALUES (3, '5')", db::kErrDuplicateKey},
+      {"tCash (TransID, AccountKey) VALUES (9, '123456789')", db::kErrFieldTooSmall},
+      {"tItem (ItemKey) VALUES ('A')", 0},
+      {"tItem (ItemKey) VALUES ('A')", db::kErrDuplicateKey},
+      {"tItem (ItemKey) VALUES ('')", db::kErrZeroLength}};
+  for (const auto& [insert, error] : cases) {
+    EXPECT_EQ(ErrorOf(*work_, std::string("INSERT INTO ") + insert), error) << insert;
   }
+  EXPECT_EQ(
+      ErrorOf(*select_, "INSERT INTO tSelectAccount (AccountKey, SortByKey) VALUES ('100', 'q')"),
+      db::kErrDuplicateKey);
+  EXPECT_EQ(
+      ErrorOf(*select_, "INSERT INTO tSelectAccount (AccountKey, SortByKey) VALUES ('q', '  100')"),
+      db::kErrDuplicateKey);
   // Nothing of the refused rows was stored; the first row stays as it was.
-  EXPECT_EQ(Column(*work_,
-                   "SELECT AccountName FROM tAccount WHERE AccountKey Like 'n*' OR "
-                   "AccountKey = '100' ORDER BY 1",
+  EXPECT_EQ(Column(*work_, "SELECT AccountName FROM tAccount WHERE AccountKey In ('n', '100')",
                    "AccountName"),
-            (Keys{"NULL", "כהן משה"}));
+            (Keys{"כהן משה", "NULL"}));
 }
 
 }  // namespace
