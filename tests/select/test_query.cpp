@@ -7,6 +7,7 @@
 #include <functional>
 #include <stdexcept>
 #include <string>
+#include <tuple>
 
 #include "import/doctypes.h"
 #include "select/select.h"
@@ -152,24 +153,18 @@ TEST(SelectTest, ColumnsFromTheHeaderOnlyForIssuedStockDocumentsAddressedFromIt)
 }
 
 // Each piece gets pUseDocs afresh, so the cash-receipt reset in the column list does not take
-// the tCash test out of the WHERE clause.
+// the tCash test out of the WHERE clause; greyed documents ignore the by-document choice.
 TEST(StatementTest, PiecesInOrderWithUseDocsComputedForEach) {
-  Panel panel;
-  panel.ChkDates = 1;
-  panel.cmbDocType = kCashReceiptsRow;
-  const DocTypeTable docTypes;
-  EXPECT_EQ(BuildRecipientsStatement(panel, docTypes, ""), std::string(kAccountColumns) +
-                                                               " FROM tAccount" + kWhere + kCashIn +
-                                                               " ORDER BY tAccount.SortByKey ASC");
-  panel.cmbByDoc = 1;
-  panel.cmbDocType = 13;
-  EXPECT_EQ(BuildRecipientsStatement(panel, docTypes, ""),
-            std::string(kAccountColumns) + " FROM tAccount" + kWhere + kNotIssued +
-                " ORDER BY tAccount.SortByKey ASC");
-  panel.ChkDates = 2;  // greyed: documents off, by-document choice ignored
-  EXPECT_EQ(BuildRecipientsStatement(panel, docTypes, ""), std::string(kAccountColumns) +
-                                                               " FROM tAccount" + kWhere +
-                                                               " ORDER BY tAccount.SortByKey ASC");
+  const std::tuple<int, int, int, const char*> cases[] = {
+      {1, 0, kCashReceiptsRow, kCashIn}, {1, 1, 13, kNotIssued}, {2, 1, 13, ""}};
+  for (const auto& [dates, byDoc, docType, criterion] : cases) {
+    Panel panel;
+    panel.ChkDates = dates, panel.cmbByDoc = byDoc, panel.cmbDocType = docType;
+    EXPECT_EQ(BuildRecipientsStatement(panel, DocTypeTable(), ""),
+              std::string(kAccountColumns) + " FROM tAccount" + kWhere + criterion +
+                  " ORDER BY tAccount.SortByKey ASC")
+        << dates << " " << byDoc;
+  }
 }
 
 }  // namespace
