@@ -78,12 +78,12 @@ const CodeFile kCodes[] = {{1, 2},  {2, 2},  {3, 2},  {4, 2},  {5, 2},  {6, 2}, 
 void FillAddressFields(const AccountTruth& t, AccountFields& f) {
   f.sortCode = t.sortCode;
   f.cutOff = t.cutOff;
-  f.telephone = HostField(t.telephone, 30);
-  f.address = HostField(t.address, 30);
-  f.district = HostField(t.district, 15);
-  f.city = HostField(t.city, 15);
-  f.zip = HostField(t.zip, 5);
-  f.details = HostField(t.details, 50);
+  f.telephone = HostField(t.telephone, account::kTelephone.width);
+  f.address = HostField(t.address, account::kAddress.width);
+  f.district = HostField(t.district, account::kDistrict.width);
+  f.city = HostField(t.city, account::kCity.width);
+  f.zip = HostField(t.zip, account::kZip.width);
+  f.details = HostField(t.details, account::kDetails.width);
   f.agent = t.agent;
 }
 
@@ -313,7 +313,7 @@ struct Generator {
       } else {
         t.key = std::to_string(number += rnd.Between(1, 9));
       }
-      if (!t.deleted) f.key = HostField(t.key, 8);
+      if (!t.deleted) f.key = HostField(t.key, account::kKey.width);
 
       auto [name, clear] = AccountName();
       t.name = name;
@@ -331,7 +331,7 @@ struct Generator {
       t.cutOff = CutOff();
       t.agent = static_cast<uint8_t>(rnd.Between(0, 30));
 
-      f.name = HostField(t.name, 30);
+      f.name = HostField(t.name, account::kName.width);
       FillAddressFields(t, f);
       records.push_back(AccountRecord(f));
 
@@ -375,12 +375,12 @@ struct Generator {
         t.city = "ירושלים";
       }
       AccountFields f;
-      f.key = HostField(t.key, 8);
-      f.name = HostField(t.name, 30);
+      f.key = HostField(t.key, account::kKey.width);
+      f.name = HostField(t.name, account::kName.width);
       if (kind == "character") {
         // A box-drawing character of the host's screen, kept as its byte by the import.
         t.name = "מאפיית כהן";
-        f.name = PadRaw("\xD9 " + HostVisual(t.name), 30);
+        f.name = PadRaw("\xD9 " + HostVisual(t.name), account::kName.width);
         t.unambiguousText = false;
       }
       FillAddressFields(t, f);
@@ -418,8 +418,8 @@ struct Generator {
       }
       t.sortCode = SortCode();
       ItemFields f;
-      f.key = HostField(t.key, 12);
-      f.name = HostField(rnd.Pick(kItemNames), 40);
+      f.key = HostField(t.key, item::kKey.width);
+      f.name = HostField(rnd.Pick(kItemNames), item::kName.width);
       f.sortCode = t.sortCode;
       records.push_back(ItemRecord(f));
       if (!t.key.empty() && !t.duplicateKey) itemKeys.push_back(f.key);
@@ -471,13 +471,13 @@ struct Generator {
         if (!line2.empty()) {
           line2 += " " + (rnd.Chance(50) ? Digits(rnd, 5) : Digits(rnd, 7));
         }
-        h.address2 = HostField(line2, 30);
+        h.address2 = HostField(line2, document::kAddress2.width);
       } else {
-        h.name = HostField("לקוח מזדמן", 30);
+        h.name = HostField("לקוח מזדמן", document::kName.width);
       }
       h.reference = std::to_string(t.reference);
-      h.details = rnd.Chance(30)   ? HostField(rnd.Pick(kDocDetails), 48)
-                  : rnd.Chance(20) ? HostField("לידי " + PersonName(rnd), 48)
+      h.details = rnd.Chance(30) ? HostField(rnd.Pick(kDocDetails), document::kDetails.width)
+                  : rnd.Chance(20) ? HostField("לידי " + PersonName(rnd), document::kDetails.width)
                                    : "";
       h.lineCount = static_cast<uint8_t>(lines);
       out.Add(DocHeaderRecord(h));
@@ -538,7 +538,7 @@ struct Generator {
       t.valueDate = AddMonths(t.date, rnd.Between(0, 2));
       LedgerFields f;
       f.journal = t.journal;
-      f.type = HostField(t.type, 3);
+      f.type = HostField(t.type, ledger::kType.width);
       f.keys = EntryKeys(t.accountIndex);
       f.date = t.date;
       f.valueDate = t.valueDate;
@@ -564,7 +564,7 @@ struct Generator {
         t.date = RandomDate(rnd);
         t.valueDate = AddMonths(t.date, rnd.Between(0, 2));
         BatchFields f;
-        f.type = HostField(t.type, 3);
+        f.type = HostField(t.type, batch::kType.width);
         f.keys = EntryKeys(t.accountIndex);
         f.date = t.date;
         f.valueDate = t.valueDate;
@@ -603,7 +603,7 @@ CompanyTruth WriteCompany(const fs::path& folder, const Options& options,
   Generator g(options.seed, options);
   g.truth.folder = folder;
   g.truth.companyName = std::string(companyName);
-  WriteRecords(folder / "ADF.FIX", {CompanyRecord(HostField(companyName, 20))});
+  WriteRecords(folder / "ADF.FIX", {CompanyRecord(HostField(companyName, company::kName.width))});
   g.WriteAccounts(folder);
   g.WriteItems(folder);
   g.WriteDocuments(folder);

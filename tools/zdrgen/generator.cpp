@@ -55,14 +55,19 @@ struct BidiCloser {
 // ---------------------------------------------------------------------------------------
 // Record assembly: fields are copied into a record already filled with its background.
 
-void Put(std::string& rec, size_t offset, std::string_view bytes, size_t width) {
-  if (bytes.size() > width) {
-    throw std::length_error("field of " + std::to_string(width) + " bytes at offset " +
-                            std::to_string(offset) + " given " + std::to_string(bytes.size()) +
+void Put(std::string& rec, FieldAt field, std::string_view bytes) {
+  if (bytes.size() > field.width) {
+    throw std::length_error("field of " + std::to_string(field.width) + " bytes at offset " +
+                            std::to_string(field.at) + " given " + std::to_string(bytes.size()) +
                             " bytes");
   }
-  std::memcpy(rec.data() + offset, bytes.data(), bytes.size());
-  std::memset(rec.data() + offset + bytes.size(), ' ', width - bytes.size());
+  std::memcpy(rec.data() + field.at, bytes.data(), bytes.size());
+  std::memset(rec.data() + field.at + bytes.size(), ' ', field.width - bytes.size());
+}
+
+// The `index`th of the fields of `field`'s width that follow each other from `field`.
+constexpr FieldAt Nth(FieldAt field, size_t index) {
+  return {field.at + index * field.width, field.width};
 }
 
 void PutByte(std::string& rec, size_t offset, uint8_t b) {
@@ -75,8 +80,16 @@ void PutDate(std::string& rec, size_t offset, HostDate d) {
   PutByte(rec, offset + 2, d.day);
 }
 
-void PutLE(std::string& rec, size_t offset, uint64_t v, size_t width) {
-  for (size_t i = 0; i < width; ++i) rec[offset + i] = static_cast<char>((v >> (8 * i)) & 0xFF);
+void PutLE(std::string& rec, FieldAt field, uint64_t v) {
+  for (size_t i = 0; i < field.width; ++i) {
+    rec[field.at + i] = static_cast<char>((v >> (8 * i)) & 0xFF);
+  }
+}
+
+// Zeros over each of `fields`.
+template <size_t N>
+void Zero(std::string& rec, const FieldAt (&fields)[N]) {
+  for (const FieldAt& f : fields) std::memset(rec.data() + f.at, 0, f.width);
 }
 
 }  // namespace
@@ -127,113 +140,100 @@ std::string PadRaw(std::string_view bytes, size_t width) {
 // in numeric ones, as a freshly created host record would hold.
 
 std::string AccountRecord(const AccountFields& f) {
+  using namespace account;
   std::string r(kAccountRecordLength, ' ');
-  Put(r, 0, f.key, 8);
-  Put(r, 8, f.name, 30);
-  Put(r, 38, f.sortCode, 3);
-  Put(r, 52, f.cutOff, 4);
-  Put(r, 60, f.telephone, 30);
-  Put(r, 90, f.address, 30);
-  Put(r, 120, f.district, 15);
-  Put(r, 135, f.city, 15);
-  Put(r, 150, f.zip, 5);
-  Put(r, 167, f.details, 50);
-  // Binary fields from 217 to 316 (flags, amounts, counters) are zero.
-  std::memset(r.data() + 217, 0, 286 - 217);
-  PutByte(r, 324, f.agent);
-  PutByte(r, 325, 0);
-  PutLE(r, 326, 0, 2);
-  PutLE(r, 358, 0, 8);
-  PutLE(r, 368, 0, 8);
-  PutLE(r, 558, 0, 8);
-  PutLE(r, 566, 0, 8);
-  PutLE(r, 576, 0, 4);
-  PutLE(r, 580, 0, 8);
-  std::memset(r.data() + 608, 0, 638 - 608);
+  Put(r, kKey, f.key);
+  Put(r, kName, f.name);
+  Put(r, kSortCode, f.sortCode);
+  Put(r, kCutOff, f.cutOff);
+  Put(r, kTelephone, f.telephone);
+  Put(r, kAddress, f.address);
+  Put(r, kDistrict, f.district);
+  Put(r, kCity, f.city);
+  Put(r, kZip, f.zip);
+  Put(r, kDetails, f.details);
+  PutByte(r, kAgentAt, f.agent);
+  Zero(r, kZeroed);
   return r;
 }
 
 std::string ItemRecord(const ItemFields& f) {
   std::string r(kItemRecordLength, ' ');
-  Put(r, 0, f.key, 12);
-  Put(r, 12, f.name, 40);
-  Put(r, 52, f.sortCode, 3);
-  std::memset(r.data() + 162, 0, 9);
-  std::memset(r.data() + 176, 0, 264 - 176);
-  std::memset(r.data() + 278, 0, 420 - 278);
+  Put(r, item::kKey, f.key);
+  Put(r, item::kName, f.name);
+  Put(r, item::kSortCode, f.sortCode);
+  Zero(r, item::kZeroed);
   return r;
 }
 
 std::string DocHeaderRecord(const DocHeaderFields& f) {
+  using namespace document;
   std::string r(kDocumentRecordLength, ' ');
-  PutByte(r, 0, f.kind);
-  PutByte(r, 1, f.type);
-  Put(r, 2, f.accountKey, 8);
-  Put(r, 10, f.name, 30);
-  Put(r, 40, f.address1, 30);
-  Put(r, 70, f.address2, 30);
-  Put(r, 100, f.reference, 5);
-  Put(r, 110, f.details, 48);
-  PutByte(r, 158, f.lineCount);
+  PutByte(r, kKindAt, f.kind);
+  PutByte(r, kTypeAt, f.type);
+  Put(r, kAccountKey, f.accountKey);
+  Put(r, kName, f.name);
+  Put(r, kAddress1, f.address1);
+  Put(r, kAddress2, f.address2);
+  Put(r, kReference, f.reference);
+  Put(r, kDetails, f.details);
+  PutByte(r, kLineCountAt, f.lineCount);
   return r;
 }
 
 std::string DocSecondHeaderRecord(HostDate documentDate, HostDate dueDate) {
+  using namespace document;
   std::string r(kDocumentRecordLength, ' ');
-  PutByte(r, 0, 0);
-  PutDate(r, 102, documentDate);
-  PutDate(r, 105, dueDate);
+  PutByte(r, kKindAt, 0);
+  PutDate(r, kDocumentDateAt, documentDate);
+  PutDate(r, kDueDateAt, dueDate);
   return r;
 }
 
 std::string DocLineRecord(const DocLineFields& f) {
+  using namespace document;
   std::string r(kDocumentRecordLength, ' ');
-  PutByte(r, 0, f.kind);
-  Put(r, 1, f.itemKey, 12);
-  std::memset(r.data() + 53, 0, 40);  // quantities and prices
-  PutByte(r, 93, f.type);
+  PutByte(r, kKindAt, f.kind);
+  Put(r, kItemKey, f.itemKey);
+  Zero(r, kLineZeroed);
+  PutByte(r, kLineTypeAt, f.type);
   return r;
 }
 
 std::string LedgerRecord(const LedgerFields& f) {
+  using namespace ledger;
   std::string r(kLedgerRecordLength, ' ');
-  PutLE(r, 0, static_cast<uint16_t>(f.journal), 2);
-  Put(r, 2, f.type, 3);
-  PutByte(r, 37, 0);
-  PutByte(r, 38, 0);
-  for (int k = 0; k < 4; ++k) Put(r, 44 + 8 * k, f.keys[k], 8);
-  PutDate(r, 76, f.date);
-  PutDate(r, 79, f.valueDate);
-  std::memset(r.data() + 82, 0, 170 - 82);
+  PutLE(r, kJournal, static_cast<uint16_t>(f.journal));
+  Put(r, kType, f.type);
+  for (size_t k = 0; k < f.keys.size(); ++k) Put(r, Nth(kKeys, k), f.keys[k]);
+  PutDate(r, kDateAt, f.date);
+  PutDate(r, kValueDateAt, f.valueDate);
+  Zero(r, kZeroed);
   return r;
 }
 
 std::string BatchRecord(const BatchFields& f) {
+  using namespace batch;
   std::string r(kBatchRecordLength, ' ');
-  PutByte(r, 0, 0);
-  Put(r, 1, f.type, 3);
-  PutByte(r, 50, 0);
-  PutByte(r, 51, 0);
-  for (int k = 0; k < 4; ++k) Put(r, 57 + 8 * k, f.keys[k], 8);
-  PutDate(r, 89, f.date);
-  PutDate(r, 92, f.valueDate);
-  std::memset(r.data() + 96, 0, 176 - 96);
+  Put(r, kType, f.type);
+  for (size_t k = 0; k < f.keys.size(); ++k) Put(r, Nth(kKeys, k), f.keys[k]);
+  PutDate(r, kDateAt, f.date);
+  PutDate(r, kValueDateAt, f.valueDate);
+  Zero(r, kZeroed);
   return r;
 }
 
 std::string CashRecord(const CashFields& f) {
   std::string r(kCashRecordLength, ' ');
-  Put(r, 0, f.accountKey, 8);
-  PutByte(r, 13, 0);
-  PutDate(r, 14, f.date);
-  std::memset(r.data() + 17, 0, 3);
-  std::memset(r.data() + 54, 0, 19);
+  Put(r, cash::kAccountKey, f.accountKey);
+  PutDate(r, cash::kDateAt, f.date);
+  Zero(r, cash::kZeroed);
   return r;
 }
 
 std::string CompanyRecord(std::string_view name) {
   std::string r(kCompanyRecordLength, ' ');
-  Put(r, 0, name, 20);
+  Put(r, company::kName, name);
   return r;
 }
 

@@ -34,6 +34,71 @@ inline constexpr size_t kCompanyRecordLength = 7359;  // ADF.FIX
 // The deleted-account mark: the key field holds 0x01 followed by blanks.
 inline constexpr char kDeletedMark = '\x01';
 
+// Where a field sits in its record: its first byte (from 0) and its width in bytes. Each
+// layout below is the generator's own account of the host's records.
+struct FieldAt {
+  size_t at;
+  size_t width;
+};
+
+// ACT.fix.
+namespace account {
+inline constexpr FieldAt kKey{0, 8}, kName{8, 30}, kSortCode{38, 3}, kCutOff{52, 4},
+    kTelephone{60, 30}, kAddress{90, 30}, kDistrict{120, 15}, kCity{135, 15}, kZip{150, 5},
+    kDetails{167, 50};
+inline constexpr size_t kAgentAt = 324;
+// Flags, amounts and counters the system does not read, written as zeros.
+inline constexpr FieldAt kZeroed[] = {{217, 69}, {325, 3},  {358, 8}, {368, 8},
+                                      {558, 16}, {576, 12}, {608, 30}};
+}  // namespace account
+
+// ITM.fix.
+namespace item {
+inline constexpr FieldAt kKey{0, 12}, kName{12, 40}, kSortCode{52, 3};
+// Quantities and prices.
+inline constexpr FieldAt kZeroed[] = {{162, 9}, {176, 88}, {278, 142}};
+}  // namespace item
+
+// The stock-document files: a header record, a second header record, then the lines.
+namespace document {
+inline constexpr size_t kKindAt = 0, kTypeAt = 1, kLineCountAt = 158;
+inline constexpr FieldAt kAccountKey{2, 8}, kName{10, 30}, kAddress1{40, 30}, kAddress2{70, 30},
+    kReference{100, 5}, kDetails{110, 48};
+// The second header record.
+inline constexpr size_t kDocumentDateAt = 102, kDueDateAt = 105;
+// A line.
+inline constexpr FieldAt kItemKey{1, 12};
+inline constexpr size_t kLineTypeAt = 93;
+// A line's quantities and prices.
+inline constexpr FieldAt kLineZeroed[] = {{53, 40}};
+}  // namespace document
+
+// amv.fix: the journal is a 16-bit little-endian number; four account keys follow each other.
+namespace ledger {
+inline constexpr FieldAt kJournal{0, 2}, kType{2, 3}, kKeys{44, 8};
+inline constexpr size_t kDateAt = 76, kValueDateAt = 79;
+inline constexpr FieldAt kZeroed[] = {{37, 2}, {82, 88}};
+}  // namespace ledger
+
+// a<N>.tmp.
+namespace batch {
+inline constexpr FieldAt kType{1, 3}, kKeys{57, 8};
+inline constexpr size_t kDateAt = 89, kValueDateAt = 92;
+inline constexpr FieldAt kZeroed[] = {{0, 1}, {50, 2}, {96, 80}};
+}  // namespace batch
+
+// icash2.fix.
+namespace cash {
+inline constexpr FieldAt kAccountKey{0, 8};
+inline constexpr size_t kDateAt = 14;
+inline constexpr FieldAt kZeroed[] = {{13, 1}, {17, 3}, {54, 19}};
+}  // namespace cash
+
+// ADF.FIX.
+namespace company {
+inline constexpr FieldAt kName{0, 20};
+}  // namespace company
+
 // ---------------------------------------------------------------------------------------
 // Host text.
 
