@@ -5,6 +5,7 @@
 
 #include <algorithm>
 #include <fstream>
+#include <functional>
 #include <iterator>
 #include <set>
 #include <string>
@@ -13,15 +14,15 @@
 #include "control/control.h"
 #include "control/dataload.h"
 #include "control/panel.h"
+#include "import/codepage.h"
 #include "import/doctypes.h"
-#include "importtest.h"
 #include "output/output.h"
+#include "support/importtest.h"
 #include "zdrgen/generator.h"
 
 namespace zdr {
 namespace {
 
-using test::ImportTest;
 using Strings = std::vector<std::string>;
 using zdrgen::HostDate;
 
@@ -34,7 +35,7 @@ const std::string kLedger = "קורא תנועות הנהלת חשבונות..."
 const std::string kBatches = "קורא מנות ממאגר זמני...";
 const std::string kDone = "קריאת הנתונים הסתיימה";
 
-class DataLoad : public ImportTest {
+class DataLoad : public test::ImportTest {
  protected:
   void SetUp() override {
     ImportTest::SetUp();
@@ -42,117 +43,82 @@ class DataLoad : public ImportTest {
     // Accounts 12 and 34 between the two records that are never read.
     std::vector<std::string> accounts;
     for (const char* key : {"FIRST", "12", "34", "LAST"}) {
-      zdrgen::AccountFields f;
-      f.key = key;
-      accounts.push_back(zdrgen::AccountRecord(f));
+      accounts.push_back(zdrgen::AccountRecord({key, "", "", "", "", "", "", "", "", ""}));
     }
     Write("ACT.fix", accounts);
-
-    zdrgen::DocHeaderFields h;
-    h.type = 1;
-    h.accountKey = "12";
-    h.lineCount = 1;
-    zdrgen::DocLineFields l;
-    l.itemKey = "I1";
-    l.type = 1;
+    const HostDate day = HostDate::Of(2020, 1, 1);
     Write("IMV.FIX",
-          {zdrgen::DocHeaderRecord(h),
-           zdrgen::DocSecondHeaderRecord(HostDate::Of(2020, 1, 1), HostDate::Of(2020, 1, 1)),
-           zdrgen::DocLineRecord(l)});
-    zdrgen::ItemFields item;
-    item.key = "I1";
-    Write("ITM.fix",
-          {zdrgen::ItemRecord(item), zdrgen::ItemRecord(item), zdrgen::ItemRecord(item)});
-    zdrgen::CashFields c;
-    c.accountKey = "43";
-    c.date = HostDate::Of(2020, 1, 1);
-    Write("icash2.fix", {zdrgen::CashRecord(c)});
-    zdrgen::LedgerFields t;
-    t.journal = 3;
-    t.type = "A";
-    t.keys = {"21", "", "", ""};
-    Write("amv.fix", {zdrgen::LedgerRecord(t)});
-    zdrgen::BatchFields b;
-    b.type = "A";
-    b.keys = {"43", "", "", ""};
-    Write("a7.tmp", {zdrgen::BatchRecord(b)});
+          {zdrgen::DocHeaderRecord({1, 1, "12", "", "", "", "", "", 1}),
+           zdrgen::DocSecondHeaderRecord(day, day), zdrgen::DocLineRecord({2, "I1", 1})});
+    Write("ITM.fix", std::vector<std::string>(3, zdrgen::ItemRecord({"I1", "", ""})));
+    Write("icash2.fix", {zdrgen::CashRecord({"43", day})});
+    Write("amv.fix", {zdrgen::LedgerRecord({3, "A", {"21", "", "", ""}, day, day})});
+    Write("a7.tmp", {zdrgen::BatchRecord({"A", {"43", "", "", ""}, day, day})});
   }
 
   void Load(bool asIs = true) { ReadAllData(asIs, panel_, state_, docTypes_, seam_); }
-  int64_t Rows(const std::string& table) { return Count(state_.workDbPath, table); }
+  Strings Query(const std::string& sql) { return Rows(state_.workDbPath, sql); }
+  // The row counts of tAccount, tStockHead, tStockLine, tItem, tCash and tTransact.
+  std::string Counts() {
+    std::string out;
+    for (const char* t : {"tAccount", "tStockHead", "tStockLine", "tItem", "tCash", "tTransact"}) {
+      out += std::to_string(Count(state_.workDbPath, t));
+    }
+    return out;
+  }
 
   Panel panel_;
   ControlState state_;
   DocTypeTable docTypes_;
 };
 
-TEST_F(DataLoad, EveryCriterionOffReadsOnlyTheAccounts) {
-  panel_.chkReadTempTrans = 1;  // no effect without a ledger criterion
-  panel_.ChkByItems = 1;        // no effect with ChkDates off
-  Load();
-  EXPECT_EQ(seam_.statuses, (Strings{kInit, kAccounts, kDone}));
-  EXPECT_TRUE(seam_.messages.empty());
-  EXPECT_FALSE(state_.workDbPath.empty());
-  EXPECT_EQ(Rows("tAccount"), 2);
-  for (const char* t : {"tStockHead", "tStockLine", "tItem", "tCash", "tTransact"}) {
-    EXPECT_EQ(Rows(t), 0) << t;
+TEST_F(DataLoad, WhichImportersRunInWhichOrder) {
+  struct Case {
+    const char* what;
+    std::function<void(Panel&)> set;
+    Strings statuses;
+    const char* counts;
+  };
+  const Case cases[] = {
+      {"every criterion off; batches and items need another criterion",
+       [](Panel& p) { p.chkReadTempTrans = 1, p.ChkByItems = 1; },
+       {kInit, kAccounts, kDone},
+       "200000"},
+      {"cash receipts instead of documents, even with items",
+       [](Panel& p) { p.ChkDates = 1, p.cmbDocType = kCashReceiptsRow, p.ChkByItems = 1; },
+       {kInit, kAccounts, kCash, kDone},
+       "200010"},
+      {"documents with lines, then items",
+       [](Panel& p) { p.ChkDates = 1, p.cmbDocType = 0, p.ChkByItems = 1; },
+       {kInit, kAccounts, kDocs, kItems, kDone},
+       "211100"},
+      {"documents without items keep no lines",
+       [](Panel& p) { p.ChkDates = 1; },
+       {kInit, kAccounts, kDocs, kDone},
+       "210000"},
+      {"no document type chosen",
+       [](Panel& p) { p.ChkDates = 1, p.cmbDocType = -1; },
+       {kInit, kAccounts, kDone},
+       "200000"},
+      {"ledger, then batches",
+       [](Panel& p) { p.ChkJournal = 1, p.txtFromJournal = "1", p.chkReadTempTrans = 1; },
+       {kInit, kAccounts, kLedger, kBatches, kDone},
+       "200002"},
+      {"ledger without batches",
+       [](Panel& p) { p.chkTransType = 1, p.txtTransType = "*"; },
+       {kInit, kAccounts, kLedger, kDone},
+       "200001"},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(c.what);
+    panel_ = Panel{};
+    c.set(panel_);
+    seam_.statuses.clear();
+    Load();
+    EXPECT_EQ(seam_.statuses, c.statuses);
+    EXPECT_TRUE(seam_.messages.empty());
+    EXPECT_EQ(Counts(), c.counts);
   }
-}
-
-TEST_F(DataLoad, CashReceiptsInsteadOfDocumentsEvenWithItems) {
-  panel_.ChkDates = 1;
-  panel_.cmbDocType = kCashReceiptsRow;
-  panel_.ChkByItems = 1;
-  Load();
-  EXPECT_EQ(seam_.statuses, (Strings{kInit, kAccounts, kCash, kDone}));
-  EXPECT_EQ(Rows("tCash"), 1);
-  EXPECT_EQ(Rows("tStockHead"), 0);
-  EXPECT_EQ(Rows("tItem"), 0);
-}
-
-TEST_F(DataLoad, DocumentsWithLinesThenItems) {
-  panel_.ChkDates = 1;
-  panel_.cmbDocType = 0;
-  panel_.ChkByItems = 1;
-  Load();
-  EXPECT_EQ(seam_.statuses, (Strings{kInit, kAccounts, kDocs, kItems, kDone}));
-  EXPECT_TRUE(seam_.messages.empty());
-  EXPECT_EQ(Rows("tStockHead"), 1);
-  EXPECT_EQ(Rows("tStockLine"), 1);
-  EXPECT_EQ(Rows("tItem"), 1);
-}
-
-TEST_F(DataLoad, DocumentsWithoutItemsKeepNoLines) {
-  panel_.ChkDates = 1;
-  Load();
-  EXPECT_EQ(seam_.statuses, (Strings{kInit, kAccounts, kDocs, kDone}));
-  EXPECT_EQ(Rows("tStockHead"), 1);
-  EXPECT_EQ(Rows("tStockLine"), 0);
-}
-
-TEST_F(DataLoad, NoDocumentTypeChosenReadsNoDocuments) {
-  panel_.ChkDates = 1;
-  panel_.cmbDocType = -1;
-  Load();
-  EXPECT_EQ(seam_.statuses, (Strings{kInit, kAccounts, kDone}));
-}
-
-TEST_F(DataLoad, LedgerThenBatches) {
-  panel_.ChkJournal = 1;
-  panel_.txtFromJournal = "1";
-  panel_.chkReadTempTrans = 1;
-  Load();
-  EXPECT_EQ(seam_.statuses, (Strings{kInit, kAccounts, kLedger, kBatches, kDone}));
-  EXPECT_TRUE(seam_.messages.empty());
-  EXPECT_EQ(Count(state_.workDbPath, "tTransact"), 2);
-}
-
-TEST_F(DataLoad, LedgerWithoutBatches) {
-  panel_.chkTransType = 1;
-  panel_.txtTransType = "*";
-  Load();
-  EXPECT_EQ(seam_.statuses, (Strings{kInit, kAccounts, kLedger, kDone}));
-  EXPECT_EQ(Count(state_.workDbPath, "tTransact"), 1);
 }
 
 TEST_F(DataLoad, BadJournalBoundEndsTheLoadAtTheBatches) {
@@ -163,11 +129,11 @@ TEST_F(DataLoad, BadJournalBoundEndsTheLoadAtTheBatches) {
   // The ledger import reported the bound itself; the batch listing let it escape.
   EXPECT_EQ(seam_.statuses, (Strings{kInit, kAccounts, kLedger, kBatches}));
   EXPECT_EQ(seam_.messages.size(), 1u);
-  EXPECT_EQ(Rows("tAccount"), 2);
+  EXPECT_EQ(Count(state_.workDbPath, "tAccount"), 2);
 }
 
 TEST_F(DataLoad, FailedDatabaseCreationStoresEmptyPathAndGoesOn) {
-  ::setenv("Temp", (root_ / "missing" / "folder").c_str(), 1);
+  test::ScopedEnv temp("Temp", (root_ / "missing" / "folder").c_str());
   state_.workDbPath = "old";
   Load();
   EXPECT_EQ(state_.workDbPath, "");
@@ -180,43 +146,34 @@ TEST_F(DataLoad, FailedDatabaseCreationStoresEmptyPathAndGoesOn) {
 TEST_F(DataLoad, AsIsReachesTheAccountImportAndCutOffBoxIsWrittenBack) {
   panel_.chkCutOff = 1;
   panel_.CutOff[4] = "";
+  state_.selectDbPath = CreateSelectDB(seam_);  // the picker was used: its table is linked
   Load(true);
   EXPECT_EQ(panel_.CutOff[4], " ");
-  EXPECT_EQ(
-      ImportTest::Rows(state_.workDbPath, "SELECT AccountKey FROM tAccount ORDER BY SortByKeyVal"),
-      (Strings{"21", "43"}));
-  Load(false);
-  EXPECT_EQ(
-      ImportTest::Rows(state_.workDbPath, "SELECT AccountKey FROM tAccount ORDER BY SortByKeyVal"),
-      (Strings{"12", "34"}));
-}
-
-TEST_F(DataLoad, LinksTheSelectionTableOnceThePickerWasUsed) {
-  state_.selectDbPath = CreateSelectDB(seam_);
-  ASSERT_FALSE(state_.selectDbPath.empty());
-  Load();
+  EXPECT_EQ(Query("SELECT AccountKey FROM tAccount ORDER BY SortByKeyVal"), (Strings{"21", "43"}));
   EXPECT_EQ(Count(state_.workDbPath, "tSelectAccount"), 0);
+  Load(false);
+  EXPECT_EQ(Query("SELECT AccountKey FROM tAccount ORDER BY SortByKeyVal"), (Strings{"12", "34"}));
 }
 
-// A generated company of ordinary size: every live account with a key of its own becomes one
-// row, and every distinct account of a ledger transaction or batch one tTransact row.
-TEST_F(DataLoad, GeneratedCompanyRowsMatchWhatWasWritten) {
-  zdrgen::Options options;
+// A generated company of ordinary size, loaded as the dispatch load does (not as-is): every
+// live account with a key of its own becomes one row, and every distinct account of a
+// ledger transaction or batch one tTransact row. The keys of the ledger, the batches and the
+// cash receipts are converted as the account keys: were they converted otherwise, digit
+// keys would miss their accounts and the payers would drop out of the dispatch file.
+TEST_F(DataLoad, GeneratedCompanyRowsMatchAndDispatchLoadLostPayersWhoseKeysConvertDifferently) {
   const zdrgen::CompanyTruth truth =
-      zdrgen::WriteCompany(root_ / "generated", options, "חברה לדוגמה");
+      zdrgen::WriteCompany(root_ / "generated", zdrgen::Options(), "חברה לדוגמה");
   state_.companyPath = truth.folder.string();
-  panel_.chkTransType = 1;
-  panel_.txtTransType = "*";
-  panel_.chkReadTempTrans = 1;
-  Load(false);
+  const std::set<std::string> stored = [&] {
+    panel_.chkTransType = 1;
+    panel_.txtTransType = "*";
+    panel_.chkReadTempTrans = 1;
+    Load(false);
+    const Strings keys = Query("SELECT AccountKey FROM tAccount");
+    return std::set<std::string>(keys.begin(), keys.end());
+  }();
   EXPECT_TRUE(seam_.messages.empty()) << seam_.messages[0].text;
-
-  int64_t accounts = 0;
-  std::set<std::string> stored;
-  for (const std::string& k :
-       ImportTest::Rows(state_.workDbPath, "SELECT AccountKey FROM tAccount")) {
-    stored.insert(k);
-  }
+  int64_t accounts = 0, transacts = 0;
   for (const auto& a : truth.accounts) {
     if (a.deleted || a.duplicateKey) continue;
     ++accounts;
@@ -224,64 +181,34 @@ TEST_F(DataLoad, GeneratedCompanyRowsMatchWhatWasWritten) {
       EXPECT_TRUE(stored.count(a.key)) << a.key;
     }
   }
-  EXPECT_EQ(Rows("tAccount"), accounts);
-
-  auto distinctKeys = [&](const std::array<int, 4>& entries) {
+  EXPECT_EQ(static_cast<int64_t>(stored.size()), accounts);
+  auto distinctKeys = [&](const zdrgen::LedgerTruth& t) {
     std::set<std::string> keys;
-    for (int idx : entries) {
+    for (int idx : t.accountIndex) {
       if (idx >= 0) keys.insert(truth.accounts[static_cast<size_t>(idx)].key);
     }
     return static_cast<int64_t>(keys.size());
   };
-  int64_t transacts = 0;
-  for (const auto& t : truth.ledger) transacts += distinctKeys(t.accountIndex);
+  for (const auto& t : truth.ledger) transacts += distinctKeys(t);
   for (const auto& b : truth.batches) {
-    if (b.number == 0) continue;
-    for (const auto& t : b.transactions) transacts += distinctKeys(t.accountIndex);
+    for (const auto& t : b.transactions) transacts += b.number == 0 ? 0 : distinctKeys(t);
   }
-  EXPECT_EQ(Rows("tTransact"), transacts);
-}
+  EXPECT_EQ(Count(state_.workDbPath, "tTransact"), transacts);
 
-// The dispatch load (not as-is) converts the keys of the ledger, the batches and the cash
-// receipts as it converts the account keys. Were they converted otherwise, digit keys would
-// miss their accounts and the payers would drop out of the dispatch file.
-TEST_F(DataLoad, DispatchLoadLostPayersWhoseKeysConvertDifferently) {
-  zdrgen::Options options;
-  const zdrgen::CompanyTruth truth =
-      zdrgen::WriteCompany(root_ / "generated", options, "חברה לדוגמה");
-  state_.companyPath = truth.folder.string();
-  struct Source {
-    const char* table;
-    void (*criterion)(Panel&);
-  };
-  const Source sources[] = {
-      {"tTransact",
-       [](Panel& p) {
-         p.chkTransType = 1;
-         p.txtTransType = "*";
-         p.chkReadTempTrans = 1;
-       }},
-      {"tCash",
-       [](Panel& p) {
-         p.ChkDates = 1;
-         p.cmbDocType = kCashReceiptsRow;
-       }},
-  };
-  for (const Source& source : sources) {
-    SCOPED_TRACE(source.table);
-    panel_ = Panel();
-    source.criterion(panel_);
-    Load(false);
+  for (const char* table : {"tTransact", "tCash"}) {
+    SCOPED_TRACE(table);
+    if (std::string(table) == "tCash") {
+      panel_ = Panel();
+      panel_.ChkDates = 1;
+      panel_.cmbDocType = kCashReceiptsRow;
+      Load(false);
+    }
     ASSERT_TRUE(seam_.messages.empty()) << seam_.messages[0].text;
-    const std::string table = source.table;
-    const Strings payers =
-        ImportTest::Rows(state_.workDbPath, "SELECT DISTINCT AccountKey FROM " + table);
+    const Strings payers = Query(std::string("SELECT DISTINCT AccountKey FROM ") + table);
     ASSERT_GT(payers.size(), 10u);
-    EXPECT_EQ(ImportTest::Rows(state_.workDbPath,
-                               "SELECT AccountKey FROM " + table +
-                                   " WHERE AccountKey Not In (SELECT AccountKey FROM tAccount)"),
+    EXPECT_EQ(Query(std::string("SELECT AccountKey FROM ") + table +
+                    " WHERE AccountKey Not In (SELECT AccountKey FROM tAccount)"),
               Strings{});
-
     // The courier layout starts each line with the account key.
     const std::string csv = (root_ / "zdpost1.csv").string();
     CreateCSV(csv, state_.workDbPath, 1, panel_, docTypes_, "", PostILSettings(), seam_);

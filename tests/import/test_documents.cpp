@@ -9,15 +9,15 @@
 #include "import/codepage.h"
 #include "import/doctypes.h"
 #include "import/importers.h"
-#include "importtest.h"
+#include "support/importtest.h"
 #include "workdb/value.h"
 #include "zdrgen/generator.h"
 
 namespace zdr {
 namespace {
 
-using test::ImportTest;
 using Strings = std::vector<std::string>;
+using Records = std::vector<std::string>;
 using zdrgen::HostDate;
 
 constexpr int kInvoiceRow = 0;    // code 1, IMV.FIX
@@ -29,45 +29,46 @@ struct Line {
 };
 
 // The records of one document: header, second header, lines.
-std::vector<std::string> Doc(int type, std::vector<Line> lines, std::string ref = "1",
-                             HostDate date = HostDate::Of(2020, 6, 15), std::string key = "100") {
+Records Doc(int type, std::vector<Line> lines, std::string ref = "1",
+            HostDate date = HostDate::Of(2020, 6, 15)) {
   zdrgen::DocHeaderFields h;
   h.type = static_cast<uint8_t>(type);
-  h.accountKey = std::move(key);
+  h.accountKey = "100";
   h.reference = std::move(ref);
   h.name = test::HostText("לקוח", 30);
   h.lineCount = static_cast<uint8_t>(lines.size());
-  std::vector<std::string> recs{zdrgen::DocHeaderRecord(h),
-                                zdrgen::DocSecondHeaderRecord(date, HostDate::Of(2020, 7, 1))};
+  Records recs{zdrgen::DocHeaderRecord(h),
+               zdrgen::DocSecondHeaderRecord(date, HostDate::Of(2020, 7, 1))};
   for (const Line& l : lines) {
-    zdrgen::DocLineFields f;
-    f.itemKey = l.item;
-    f.type = static_cast<uint8_t>(l.type);
-    recs.push_back(zdrgen::DocLineRecord(f));
+    recs.push_back(zdrgen::DocLineRecord({2, l.item, static_cast<uint8_t>(l.type)}));
   }
   return recs;
 }
 
-std::vector<std::string> Join(std::vector<std::vector<std::string>> docs) {
-  std::vector<std::string> all;
+Records Join(std::vector<Records> docs) {
+  Records all;
   for (auto& d : docs) all.insert(all.end(), d.begin(), d.end());
   return all;
 }
 
-class DocumentImport : public ImportTest {
+class DocumentImport : public test::ImportTest {
  protected:
   int32_t Run(int row = kInvoiceRow, bool withLines = true, bool asIs = false) {
     if (db_.empty()) db_ = WorkDb();
     return ReadStock(1, company_, from_, to_, db_, static_cast<uint8_t>(row), withLines, asIs,
                      panel_, docTypes_, seam_);
   }
-  Strings Heads() { return Rows(db_, "SELECT HeadIndx FROM tStockHead ORDER BY HeadIndx"); }
+  Strings Column(const char* column) {
+    return Rows(db_, std::string("SELECT ") + column + " FROM tStockHead ORDER BY HeadIndx");
+  }
 
   Panel panel_;
   DocTypeTable docTypes_;
   std::string db_, from_ = "01/01/1980", to_ = "01/01/2025";
 };
 
+// Regression inside: a header field of quotes only converts to nothing, and the empty text
+// the table refused used to end the whole document import.
 TEST_F(DocumentImport, HeaderAndLineValues) {
   zdrgen::DocHeaderFields h;
   h.type = 1;
@@ -78,185 +79,149 @@ TEST_F(DocumentImport, HeaderAndLineValues) {
   h.reference = "00042";
   h.details = test::HostText("לכבוד", 48);
   h.lineCount = 1;
-  zdrgen::DocLineFields l;
-  l.itemKey = "X-1";
-  l.type = 1;
-  Write("IMV.FIX",
-        {zdrgen::DocHeaderRecord(h),
-         zdrgen::DocSecondHeaderRecord(HostDate::Of(2021, 3, 5), HostDate::Of(2021, 4, 5)),
-         zdrgen::DocLineRecord(l)});
-  EXPECT_EQ(Run(kInvoiceRow, true, true), 4);
+  zdrgen::DocHeaderFields blank;
+  blank.lineCount = 1;
+  zdrgen::DocHeaderFields quotes = blank;
+  quotes.name = "\"\"";
+  quotes.address2 = "()";
+  quotes.details = "\"()\"";
+  Records recs;
+  for (const auto& header : {h, blank, quotes}) {
+    recs.push_back(zdrgen::DocHeaderRecord(header));
+    recs.push_back(
+        zdrgen::DocSecondHeaderRecord(HostDate::Of(2021, 3, 5), HostDate::Of(2021, 4, 5)));
+    recs.push_back(zdrgen::DocLineRecord({2, "X-" + std::to_string(recs.size()), 1}));
+  }
+  Write("IMV.FIX", recs);
+  EXPECT_EQ(Run(kInvoiceRow, true, true), 10);
   EXPECT_TRUE(seam_.messages.empty());
-  const std::string ref = std::to_string(Date::FromParts(2021, 3, 5).serial);
-  const std::string due = std::to_string(Date::FromParts(2021, 4, 5).serial);
-  EXPECT_EQ(Rows(db_,
-                 "SELECT CompID, TavFileID, HeadIndx, DocType2, Reference1, AccountKey, "
-                 "CustomerName, Address1, Address2, DetailsLine1, SortByName, SortByCity, "
-                 "Include, RefDate, DueDate, SortByZip FROM tStockHead"),
-            Strings{"1|3|1|1|42|1)BA|משה כהן|הרצל 5|חיפה|לכבוד|משה כהן|חיפה|-1|" + ref + "|" + due +
-                    "|" + Win1255ToUtf8(h.address2.substr(0, 4))});
+  const std::string dates = std::to_string(Date::FromParts(2021, 3, 5).serial) + "|" +
+                            std::to_string(Date::FromParts(2021, 4, 5).serial);
+  EXPECT_EQ(
+      Column("CompID, TavFileID, HeadIndx, DocType2, Reference1, AccountKey, CustomerName, "
+             "Address1, Address2, DetailsLine1, SortByName, SortByCity, Include, RefDate, "
+             "DueDate, SortByZip"),
+      (Strings{"1|3|1|1|42|1)BA|משה כהן|הרצל 5|חיפה|לכבוד|משה כהן|חיפה|-1|" + dates + "|" +
+                   Win1255ToUtf8(h.address2.substr(0, 4)),
+               "1|3|4|1|0|-|<null>|<null>|<null>|<null>|<null>|<null>|-1|" + dates + "|<null>",
+               "1|3|7|1|0|-|\"\"|<null>|()|<null>|''|()|-1|" + dates + "|()"}));
   EXPECT_EQ(Rows(db_,
                  "SELECT CompID, TavFileID, HeadIndx, LineIndx, Agent, ItemKey FROM "
-                 "tStockLine"),
-            Strings{"1|3|1|3|<null>|X-1"});
+                 "tStockLine ORDER BY LineIndx"),
+            (Strings{"1|3|1|3|<null>|X-2", "1|3|4|6|<null>|X-5", "1|3|7|9|<null>|X-8"}));
 }
 
-TEST_F(DocumentImport, BlankHeaderFieldsStayNullAndBlankKeyIsDash) {
-  zdrgen::DocHeaderFields h;
-  h.lineCount = 1;
-  zdrgen::DocLineFields l;
-  l.itemKey = "I1";
-  Write("IMV.FIX",
-        {zdrgen::DocHeaderRecord(h),
-         zdrgen::DocSecondHeaderRecord(HostDate::Of(2020, 1, 1), HostDate::Of(2020, 1, 1)),
-         zdrgen::DocLineRecord(l)});
-  Run();
-  EXPECT_EQ(Rows(db_,
-                 "SELECT AccountKey, CustomerName, Address1, Address2, DetailsLine1, "
-                 "SortByName, SortByCity, SortByZip, Reference1 FROM tStockHead"),
-            Strings{"-|<null>|<null>|<null>|<null>|<null>|<null>|<null>|0"});
-}
-
-// Regression: a header field of quotes only converts to nothing, and the empty text refused by
-// the table used to end the whole document import.
-TEST_F(DocumentImport, HeaderFieldOfQuotesOnlyStaysNullInsteadOfEndingImport) {
-  zdrgen::DocHeaderFields h;
-  h.name = "\"\"";
-  h.address2 = "()";
-  h.details = "\"()\"";
-  h.lineCount = 1;
-  zdrgen::DocLineFields l;
-  l.itemKey = "I1";
-  auto first = std::vector<std::string>{
-      zdrgen::DocHeaderRecord(h),
-      zdrgen::DocSecondHeaderRecord(HostDate::Of(2020, 1, 1), HostDate::Of(2020, 1, 1)),
-      zdrgen::DocLineRecord(l)};
-  Write("IMV.FIX", Join({first, Doc(1, {{"I2", 1}})}));
-  EXPECT_EQ(Run(kInvoiceRow, true, false), 7);
-  EXPECT_TRUE(seam_.messages.empty());
-  EXPECT_EQ(Heads(), (Strings{"1", "4"}));
-  EXPECT_EQ(Rows(db_,
-                 "SELECT CustomerName, Address2, DetailsLine1, SortByName, SortByZip FROM "
-                 "tStockHead WHERE HeadIndx = 1"),
-            Strings{"\"\"|()|<null>|''|()"});
-}
-
-TEST_F(DocumentImport, AllSalesInvoicesTakesCodesZeroToFour) {
-  std::vector<std::vector<std::string>> docs;
-  for (int t = 0; t <= 5; ++t) docs.push_back(Doc(t, {{"I" + std::to_string(t), t}}));
-  Write("IMV.FIX", Join(docs));
-  Run(kAllSalesInvoicesRow);
-  EXPECT_EQ(Rows(db_, "SELECT DocType2 FROM tStockHead ORDER BY HeadIndx"),
-            (Strings{"0", "1", "2", "3", "4"}));
-}
-
-TEST_F(DocumentImport, OtherRowsTakeTheirOwnCodeFromTheirFile) {
-  Write("ISHP.FIX", Join({Doc(20, {{"A", 20}}), Doc(21, {{"B", 21}})}));
-  Write("IMV.FIX", Doc(20, {{"C", 20}}));
-  Run(kDeliveryRow);
-  EXPECT_EQ(Rows(db_, "SELECT TavFileID, HeadIndx, DocType2 FROM tStockHead"), Strings{"1|1|20"});
-}
-
-TEST_F(DocumentImport, DocumentWithoutAcceptedLineLeavesNoHeader) {
-  Write("IMV.FIX", Join({Doc(1, {{"#", 1}, {"*", 1}, {"", 1}, {"I1", 2}}),  // records 1-6
-                         Doc(1, {}),                                        // 7-8
-                         Doc(1, {{"#", 1}, {"I2", 1}, {"I3", 1}})}));       // 9-13
-  Run();
-  EXPECT_EQ(Heads(), Strings{"9"});
-  EXPECT_EQ(Rows(db_, "SELECT LineIndx, ItemKey FROM tStockLine ORDER BY LineIndx"),
-            (Strings{"12|I2", "13|I3"}));
-}
-
-TEST_F(DocumentImport, WithoutLinesHeadersStillNeedAnAcceptedLine) {
-  Write("IMV.FIX", Join({Doc(1, {{"*", 1}}), Doc(1, {{"I1", 1}})}));
-  Run(kInvoiceRow, false);
-  EXPECT_EQ(Heads(), Strings{"4"});
-  EXPECT_EQ(Count(db_, "tStockLine"), 0);
-}
-
-TEST_F(DocumentImport, ExcludedDocumentsLinesAreReadAsRecords) {
-  // The first document is out of the date range and claims two lines; they are the next
-  // document's header and second header, which the scan then finds.
-  auto out = Doc(1, {}, "1", HostDate::Of(1970, 1, 1));
+// Which documents are read: the row's type code from the row's file (all sales invoices:
+// codes 0 to 4), only with an accepted line, within the dates and references.
+TEST_F(DocumentImport, WhichDocumentsAreRead) {
+  Records sales;
+  for (int t = 0; t <= 5; ++t) sales = Join({sales, Doc(t, {{"I", t}}, std::to_string(t))});
+  sales = Join({sales, Doc(20, {{"C", 20}}, "99")});
+  const Records lines = Join({Doc(1, {{"#", 1}, {"*", 1}, {"", 1}, {"I1", 2}}, "1"),  // 1-6
+                              Doc(1, {}, "2"),                                        // 7-8
+                              Doc(1, {{"#", 1}, {"I2", 1}, {"I3", 1}}, "3")});        // 9-13
+  Records dates;
+  int ref = 1;
+  for (const HostDate d : {HostDate::Of(2020, 1, 31), HostDate::Of(2020, 2, 1),
+                           HostDate::Of(2020, 2, 29), HostDate::Of(2020, 3, 1)}) {
+    dates = Join({dates, Doc(1, {{"A", 1}}, std::to_string(ref++), d)});
+  }
+  Records refs;
+  for (const char* r : {"5", "10", "12", "13", "0"}) refs = Join({refs, Doc(1, {{"A", 1}}, r)});
+  // Out of the dates and claiming two lines, which are the next document's header and second
+  // header: the scan then finds that one's lines as records.
+  Records claims = Doc(1, {}, "1", HostDate::Of(1970, 1, 1));
   zdrgen::DocHeaderFields h;
   h.type = 1;
   h.lineCount = 2;
-  out[0] = zdrgen::DocHeaderRecord(h);
-  Write("IMV.FIX", Join({out, Doc(1, {{"I1", 1}})}));
-  from_ = "01/01/2000";
-  Run();
-  EXPECT_EQ(Heads(), Strings{"3"});
-}
-
-TEST_F(DocumentImport, DateRangeInclusiveAndShortTextIsNoBound) {
-  Write("IMV.FIX", Join({Doc(1, {{"A", 1}}, "1", HostDate::Of(2020, 1, 31)),
-                         Doc(1, {{"A", 1}}, "2", HostDate::Of(2020, 2, 1)),
-                         Doc(1, {{"A", 1}}, "3", HostDate::Of(2020, 2, 29)),
-                         Doc(1, {{"A", 1}}, "4", HostDate::Of(2020, 3, 1))}));
-  from_ = "1/2/20";
-  to_ = "29/2/2020";
-  Run();
-  EXPECT_EQ(Rows(db_, "SELECT Reference1 FROM tStockHead ORDER BY HeadIndx"), (Strings{"2", "3"}));
+  claims[0] = zdrgen::DocHeaderRecord(h);
+  claims = Join({claims, Doc(1, {{"I1", 1}}, "2")});
+  struct Case {
+    const char* what;
+    const Records& records;
+    int row;
+    const char *from, *to, *fromRef, *toRef;
+    Strings refs;
+  };
+  const Case cases[] = {
+      {"all sales invoices",
+       sales,
+       kAllSalesInvoicesRow,
+       "",
+       "",
+       "",
+       "",
+       {"0", "1", "2", "3", "4"}},
+      {"deliveries from their own file", sales, kDeliveryRow, "", "", "", "", {"20"}},
+      {"accepted lines", lines, kInvoiceRow, "", "", "", "", {"3"}},
+      {"dates", dates, kInvoiceRow, "1/2/20", "29/2/2020", "", "", {"2", "3"}},
+      {"five characters is no bound",
+       dates,
+       kInvoiceRow,
+       "1/2/2",
+       "29/2/2020",
+       "",
+       "",
+       {"1", "2", "3"}},
+      {"excluded document's lines", claims, kInvoiceRow, "01/01/2000", "", "", "", {"2"}},
+      {"number at the start, halves to even",
+       refs,
+       kInvoiceRow,
+       "",
+       "",
+       " 10abc",
+       "12.5",
+       {"10", "12"}},
+      {"not a number is 0", refs, kInvoiceRow, "", "", "", "abc", {"0"}},
+  };
+  for (const Case& c : cases) {
+    SCOPED_TRACE(c.what);
+    Write("IMV.FIX", c.records);
+    Write("ISHP.FIX", Join({Doc(20, {{"A", 20}}, "20"), Doc(21, {{"B", 21}}, "21")}));
+    from_ = c.from;
+    to_ = c.to;
+    panel_.txtFromRef = c.fromRef;
+    panel_.txtToRef = c.toRef;
+    db_.clear();
+    Run(c.row);
+    EXPECT_TRUE(seam_.messages.empty());
+    EXPECT_EQ(Column("Reference1"), c.refs);
+  }
+  Write("IMV.FIX", lines);
+  panel_ = Panel{};
+  from_ = to_ = "";
   db_.clear();
-  from_ = "1/2/2";  // five characters: no bound
-  Run();
-  EXPECT_EQ(Rows(db_, "SELECT Reference1 FROM tStockHead ORDER BY HeadIndx"),
-            (Strings{"1", "2", "3"}));
-}
-
-TEST_F(DocumentImport, ReferenceRangeReadsTheNumberAtTheStart) {
-  Write("IMV.FIX",
-        Join({Doc(1, {{"A", 1}}, "5"), Doc(1, {{"A", 1}}, "10"), Doc(1, {{"A", 1}}, "12"),
-              Doc(1, {{"A", 1}}, "13"), Doc(1, {{"A", 1}}, "0")}));
-  panel_.txtFromRef = " 10abc";
-  panel_.txtToRef = "12.5";  // halves to even: 12
-  Run();
-  EXPECT_EQ(Rows(db_, "SELECT Reference1 FROM tStockHead ORDER BY HeadIndx"),
-            (Strings{"10", "12"}));
+  EXPECT_EQ(Run(), 14);  // the counter past the last record
+  EXPECT_EQ(Rows(db_, "SELECT LineIndx, ItemKey FROM tStockLine ORDER BY LineIndx"),
+            (Strings{"12|I2", "13|I3"}));
   db_.clear();
-  panel_.txtFromRef = "";
-  panel_.txtToRef = "abc";  // not a number: 0
-  Run();
-  EXPECT_EQ(Rows(db_, "SELECT Reference1 FROM tStockHead"), Strings{"0"});
+  Run(kInvoiceRow, false);
+  EXPECT_EQ(Column("HeadIndx"), Strings{"9"});
+  EXPECT_EQ(Count(db_, "tStockLine"), 0);
 }
 
-TEST_F(DocumentImport, MissingFileShowsDocumentFilesNotFound) {
+// A missing file (or a row outside the filled table) and a cut file are reported; the rows
+// written before a cut stay.
+TEST_F(DocumentImport, MissingAndCutFiles) {
   EXPECT_EQ(Run(), 0);
-  ASSERT_EQ(seam_.messages.size(), 1u);
-  EXPECT_EQ(seam_.messages[0].text, "קבצי מסמכים לא נמצאו");
-  EXPECT_EQ(seam_.messages[0].title, "שגיאה");
-  EXPECT_EQ(seam_.messages[0].icon, MsgIcon::Critical);
-}
-
-TEST_F(DocumentImport, RowOutsideTheFilledTableIsMissingFile) {
   EXPECT_EQ(Run(30), 0);
-  ASSERT_EQ(seam_.messages.size(), 1u);
-  EXPECT_EQ(seam_.messages[0].text, "קבצי מסמכים לא נמצאו");
-}
-
-TEST_F(DocumentImport, TruncatedFileReportsAndKeepsEarlierRows) {
   auto recs = Join({Doc(1, {{"A", 1}}), Doc(1, {{"B", 1}, {"C", 1}})});
   recs.pop_back();  // the last line is missing
   Write("IMV.FIX", recs);
   EXPECT_EQ(Run(), 0);
-  ASSERT_EQ(seam_.messages.size(), 1u);
-  EXPECT_EQ(seam_.messages[0].title, "שגיאה");
-  EXPECT_EQ(seam_.messages[0].icon, MsgIcon::Critical);
-  EXPECT_EQ(Heads(), (Strings{"1", "4"}));
-  EXPECT_EQ(Count(db_, "tStockLine"), 2);
-}
-
-TEST_F(DocumentImport, RaggedTailOverHalfARecordIsReported) {
-  Write("IMV.FIX", Doc(1, {{"A", 1}}));
-  AppendBytes("IMV.FIX", std::string(100, ' '));
-  EXPECT_EQ(Run(), 0);
-  EXPECT_EQ(seam_.messages.size(), 1u);
-  EXPECT_EQ(Heads(), Strings{"1"});
-}
-
-TEST_F(DocumentImport, ReturnsTheCounterPastTheLastRecord) {
-  Write("IMV.FIX", Join({Doc(2, {{"A", 2}}), Doc(1, {{"A", 1}})}));
-  EXPECT_EQ(Run(), 7);  // six records
+  Write("ISHP.FIX", Doc(20, {{"A", 20}}));
+  AppendBytes("ISHP.FIX", std::string(100, ' '));  // over half a record
+  EXPECT_EQ(Run(kDeliveryRow), 0);
+  ASSERT_EQ(seam_.messages.size(), 4u);
+  for (const auto& m : seam_.messages) {
+    EXPECT_EQ(m.title, "שגיאה");
+    EXPECT_EQ(m.icon, MsgIcon::Critical);
+  }
+  EXPECT_EQ(seam_.messages[0].text, "קבצי מסמכים לא נמצאו");
+  EXPECT_EQ(seam_.messages[1].text, "קבצי מסמכים לא נמצאו");
+  EXPECT_EQ(Rows(db_, "SELECT TavFileID, HeadIndx FROM tStockHead ORDER BY HeadIndx, TavFileID"),
+            (Strings{"1|1", "3|1", "3|4"}));
+  EXPECT_EQ(Count(db_, "tStockLine"), 3);
 }
 
 // ---- Items and the marking.
@@ -268,85 +233,57 @@ class ItemImport : public DocumentImport {
     // Headers 1 (items A1, B2), 5 (C3), 8 (Z9 only), 11 (A1 twice).
     Write("IMV.FIX", Join({Doc(1, {{"A1", 1}, {"B2", 1}}), Doc(1, {{"C3", 1}}), Doc(1, {{"Z9", 1}}),
                            Doc(1, {{"A1", 1}, {"A1", 1}})}));
-    Run();
   }
-  void WriteItems(const std::vector<std::pair<std::string, std::string>>& items) {
-    std::vector<std::string> recs;
-    zdrgen::ItemFields filler;
-    filler.key = "FIRST";
-    recs.push_back(zdrgen::ItemRecord(filler));
-    for (const auto& [key, sort] : items) {
-      zdrgen::ItemFields f;
-      f.key = key;
-      f.sortCode = sort;
-      recs.push_back(zdrgen::ItemRecord(f));
-    }
-    filler.key = "LAST";
-    recs.push_back(zdrgen::ItemRecord(filler));
+  void Items(const std::vector<std::pair<std::string, std::string>>& items) {
+    Records recs{zdrgen::ItemRecord({"FIRST", "", "  1"})};
+    for (const auto& [key, sort] : items) recs.push_back(zdrgen::ItemRecord({key, "", sort}));
+    recs.push_back(zdrgen::ItemRecord({"LAST", "", "  1"}));
     Write("ITM.fix", recs);
   }
-  Strings Marked() {
-    return Rows(db_, "SELECT HeadIndx FROM tStockHead WHERE Include = True ORDER BY HeadIndx");
+  // "items / marked headers" after the item import.
+  std::string Read() {
+    db_.clear();
+    Run();
+    ReadItem(company_, db_, panel_, seam_);
+    std::string out;
+    for (const auto& k : Rows(db_, "SELECT ItemKey FROM tItem ORDER BY ItemKey")) out += k + " ";
+    out += "/";
+    for (const auto& h :
+         Rows(db_, "SELECT HeadIndx FROM tStockHead WHERE Include ORDER BY HeadIndx")) {
+      out += " " + h;
+    }
+    return out;
   }
-  Strings Items() { return Rows(db_, "SELECT ItemKey FROM tItem ORDER BY ItemKey"); }
 };
 
-TEST_F(ItemImport, NoRangeStoresEveryKeyedItemAndMarksTheirDocuments) {
-  WriteItems({{"A1", "  1"}, {"B2", "  2"}, {"", "  3"}, {"C3", "  4"}, {"A1", "  5"}});
-  ReadItem(company_, db_, panel_, seam_);
+TEST_F(ItemImport, ItemsInRangeMarkTheirDocuments) {
+  Items({{"A1", "  1"}, {"B2", "  2"}, {"", "  3"}, {"C3", "  4"}, {"A1", "  5"}});
+  EXPECT_EQ(Read(), "A1 B2 C3 / 1 5 11");
   EXPECT_TRUE(seam_.messages.empty());
-  EXPECT_EQ(Items(), (Strings{"A1", "B2", "C3"}));
-  EXPECT_EQ(Marked(), (Strings{"1", "5", "11"}));
-}
-
-TEST_F(ItemImport, FirstAndLastRecordAreNotRead) {
-  WriteItems({{"B2", "  1"}});
-  ReadItem(company_, db_, panel_, seam_);
-  EXPECT_EQ(Items(), Strings{"B2"});
-}
-
-TEST_F(ItemImport, SortBoundIsTrimmedAndPadded) {
-  WriteItems({{"A1", "  9"}, {"C3", "  5"}});
+  // A sort bound is trimmed and padded.
+  Items({{"A1", "  9"}, {"C3", "  5"}});
   panel_.txtFromItmSort = " 7 ";
-  ReadItem(company_, db_, panel_, seam_);
-  EXPECT_EQ(Items(), Strings{"A1"});
-  EXPECT_EQ(Marked(), (Strings{"1", "11"}));
-}
-
-TEST_F(ItemImport, KeysComparedAsText) {
-  WriteItems({{"A20", "  1"}, {"A1", "  1"}, {"C3", "  1"}});
+  EXPECT_EQ(Read(), "A1 / 1 11");
+  // Keys are compared as text.
+  Items({{"A20", "  1"}, {"A1", "  1"}, {"C3", "  1"}});
+  panel_ = Panel{};
   panel_.txtFromItmKey = "A100";
   panel_.txtToItmKey = "B";
-  ReadItem(company_, db_, panel_, seam_);
-  EXPECT_EQ(Items(), Strings{"A20"});
-  EXPECT_TRUE(Marked().empty());
+  EXPECT_EQ(Read(), "A20 /");
 }
 
-TEST_F(ItemImport, NoItemInRangeClearsEveryMark) {
-  WriteItems({{"A1", "  1"}});
-  panel_.txtFromItmKey = "X";
-  ReadItem(company_, db_, panel_, seam_);
-  EXPECT_TRUE(Items().empty());
-  EXPECT_TRUE(Marked().empty());
-  EXPECT_EQ(Count(db_, "tStockHead"), 4);
-}
-
-TEST_F(ItemImport, SortBoundTooLongIsFaultAndLeavesMarks) {
-  WriteItems({{"A1", "  1"}});
+TEST_F(ItemImport, TooLongSortBoundOrMissingFileIsFaultAndLeavesMarks) {
   panel_.txtToItmSort = "1234";
-  ReadItem(company_, db_, panel_, seam_);
-  ASSERT_EQ(seam_.messages.size(), 1u);
-  EXPECT_EQ(seam_.messages[0].title, "תקלה");
-  EXPECT_EQ(seam_.messages[0].icon, MsgIcon::Information);
-  EXPECT_EQ(Marked().size(), 4u);
-}
-
-TEST_F(ItemImport, MissingFileIsFault) {
-  ReadItem(company_, db_, panel_, seam_);
-  ASSERT_EQ(seam_.messages.size(), 1u);
-  EXPECT_EQ(seam_.messages[0].title, "תקלה");
-  EXPECT_EQ(seam_.messages[0].icon, MsgIcon::Information);
-  EXPECT_EQ(Marked().size(), 4u);
+  Items({{"A1", "  1"}});
+  EXPECT_EQ(Read(), "/ 1 5 8 11");
+  std::filesystem::remove(std::filesystem::path(company_) / "ITM.fix");
+  panel_ = Panel{};
+  EXPECT_EQ(Read(), "/ 1 5 8 11");
+  ASSERT_EQ(seam_.messages.size(), 2u);
+  for (const auto& m : seam_.messages) {
+    EXPECT_EQ(m.title, "תקלה");
+    EXPECT_EQ(m.icon, MsgIcon::Information);
+  }
 }
 
 }  // namespace

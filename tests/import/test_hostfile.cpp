@@ -37,124 +37,76 @@ class HostFileTest : public ::testing::Test {
     }
     return out;
   }
+  static std::string_view RecordIn(const std::string& bytes, int64_t n, size_t length) {
+    return std::string_view(bytes).substr(static_cast<size_t>(n - 1) * length, length);
+  }
 
   test::ScratchTemp scratch_;
   const fs::path dir_ = scratch_.dir();
 };
 
-TEST_F(HostFileTest, EmptyFileHasNoRecords) {
-  Write("ACT.fix", "");
-  HostRecordFile f(dir_, "ACT.fix", 650);
-  EXPECT_EQ(f.Count(), 0.0);
-  EXPECT_EQ(f.WholeRecords(), 0);
-  EXPECT_TRUE(f.Record(1).empty());
-  EXPECT_TRUE(f.Record(0).empty());
-}
-
-TEST_F(HostFileTest, OneRecordIsReadWhole) {
-  Write("ITM.fix", Records(1, 500));
-  HostRecordFile f(dir_, "ITM.fix", 500);
-  EXPECT_EQ(f.Count(), 1.0);
-  ASSERT_EQ(f.Record(1).size(), 500u);
-  EXPECT_EQ(f.Record(1).substr(0, 2), "1:");
-  EXPECT_TRUE(f.Record(2).empty());
-}
-
-TEST_F(HostFileTest, ExactFileReadsEveryRecordInPlace) {
-  const std::string bytes = Records(10, 650);
-  Write("ACT.fix", bytes);
-  HostRecordFile f(dir_, "ACT.fix", 650);
-  EXPECT_EQ(f.Count(), 10.0);
-  EXPECT_EQ(f.WholeRecords(), 10);
-  EXPECT_EQ(f.FileSize(), 6500u);
-  for (int n = 1; n <= 10; ++n) {
-    EXPECT_EQ(f.Record(n), std::string_view(bytes).substr((n - 1) * 650, 650)) << n;
+// Each file: whole records and a partial tail. Only whole records are read, each in place;
+// numbers outside them give empty views, and the rounded count of a tail over half a record
+// names a record that is not there.
+TEST_F(HostFileTest, OnlyWholeRecordsAreReadEachInPlace) {
+  struct Case {
+    int whole;
+    size_t length, tail;
+    int64_t rounded;
+  };
+  for (const Case& c : {Case{0, 650, 0, 0}, Case{1, 500, 0, 1}, Case{10, 650, 0, 10},
+                        Case{3, 90, 40, 3}, Case{3, 90, 60, 4}}) {
+    SCOPED_TRACE(std::to_string(c.whole) + " records + " + std::to_string(c.tail));
+    const std::string bytes = Records(c.whole, c.length) + std::string(c.tail, 'Z');
+    Write("f.fix", bytes);
+    HostRecordFile f(dir_, "f.fix", c.length);
+    EXPECT_DOUBLE_EQ(f.Count(), static_cast<double>(bytes.size()) / static_cast<double>(c.length));
+    EXPECT_EQ(f.WholeRecords(), c.whole);
+    EXPECT_EQ(f.FileSize(), bytes.size());
+    EXPECT_EQ(RoundHalfEven(f.Count()), c.rounded);
+    for (int n = c.whole; n >= 1; --n) EXPECT_EQ(f.Record(n), RecordIn(bytes, n, c.length)) << n;
+    for (int64_t n : {int64_t{0}, int64_t{-1}, int64_t{c.whole + 1}, int64_t{1'000'000'000'000}}) {
+      EXPECT_TRUE(f.Record(n).empty()) << n;
+    }
   }
-  // Backwards too: a record behind the window refills it.
-  for (int n = 10; n >= 1; --n) {
-    EXPECT_EQ(f.Record(n), std::string_view(bytes).substr((n - 1) * 650, 650)) << n;
+  const std::string binary = std::string("\x01\x80\x9a\xff", 4) + std::string(3, '\0') + " ";
+  Write("ADF.FIX", binary);
+  EXPECT_EQ(HostRecordFile(dir_, "ADF.FIX", 8).Record(1), binary);
+}
+
+// 650 and 170 do not divide the read block: records straddle every block boundary, and a
+// document header held while its lines are read must survive the refills between them.
+TEST_F(HostFileTest, RecordsAcrossBlocksAndAHeldHeaderSurviveRefills) {
+  const std::string accounts = Records(4000, 650);
+  Write("ACT.fix", accounts);
+  HostRecordFile act(dir_, "ACT.fix", 650);
+  for (int n = 1; n <= 4000; ++n) ASSERT_EQ(act.Record(n), RecordIn(accounts, n, 650)) << n;
+  for (int n : {4000, 1, 1613, 1614, 1612, 3227, 2, 3999}) {
+    ASSERT_EQ(act.Record(n), RecordIn(accounts, n, 650)) << n;
   }
-}
 
-TEST_F(HostFileTest, RecordNumbersOutsideTheFileGiveEmptyViews) {
-  Write("amv.fix", Records(3, 180));
-  HostRecordFile f(dir_, "amv.fix", 180);
-  EXPECT_TRUE(f.Record(0).empty());
-  EXPECT_TRUE(f.Record(-1).empty());
-  EXPECT_TRUE(f.Record(4).empty());
-  EXPECT_TRUE(f.Record(1'000'000'000'000).empty());
-  EXPECT_EQ(f.Record(3).substr(0, 2), "3:");
-}
-
-TEST_F(HostFileTest, RaggedFileNeverReadsThePartialRecordAsWhole) {
-  std::string bytes = Records(3, 90) + std::string(40, 'Z');
-  Write("icash2.fix", bytes);
-  HostRecordFile f(dir_, "icash2.fix", 90);
-  EXPECT_DOUBLE_EQ(f.Count(), 310.0 / 90.0);
-  EXPECT_EQ(f.WholeRecords(), 3);
-  EXPECT_EQ(f.Record(3).size(), 90u);
-  EXPECT_TRUE(f.Record(4).empty());
-  // The importers round the count; a ragged tail can round up to a record that is not there.
-  EXPECT_EQ(RoundHalfEven(f.Count()), 3);
-  Write("b.fix", Records(3, 90) + std::string(60, 'Z'));
-  HostRecordFile g(dir_, "b.fix", 90);
-  EXPECT_EQ(RoundHalfEven(g.Count()), 4);
-  EXPECT_TRUE(g.Record(4).empty());
-}
-
-TEST_F(HostFileTest, RecordsCrossingTheBlockWindowReadCorrectly) {
-  // 650 does not divide a mebibyte: records straddle every block boundary of the raw file,
-  // and the window must still hold whole records.
-  const int count = 4000;  // about 2.5 MB
-  const std::string bytes = Records(count, 650);
-  Write("ACT.fix", bytes);
-  HostRecordFile f(dir_, "ACT.fix", 650);
-  ASSERT_EQ(f.WholeRecords(), count);
-  for (int n = 1; n <= count; ++n) {
-    std::string_view r = f.Record(n);
-    ASSERT_EQ(r, std::string_view(bytes).substr(static_cast<size_t>(n - 1) * 650, 650)) << n;
-  }
-  // Random access across windows.
-  for (int n : {count, 1, 1613, 1614, 1612, 3227, 2, count - 1}) {
-    ASSERT_EQ(f.Record(n), std::string_view(bytes).substr(static_cast<size_t>(n - 1) * 650, 650))
-        << n;
-  }
-}
-
-// A document header is held while its lines are read; a block refill between them must not
-// overwrite the header's bytes.
-TEST_F(HostFileTest, HeldHeaderSurvivesWindowRefill) {
   Write("IMV.FIX", "");
   const int64_t perBlock = HostRecordFile(dir_, "IMV.FIX", 170).ReadAheadRecords();
   ASSERT_EQ(perBlock, (1 << 20) / 170);
   const int count = static_cast<int>(3 * perBlock + 100);
-  const std::string bytes = Records(count, 170);
-  Write("IMV.FIX", bytes);
+  const std::string docs = Records(count, 170);
+  Write("IMV.FIX", docs);
   HostRecordFile f(dir_, "IMV.FIX", 170);
-  auto expected = [&](int64_t n) {
-    return std::string_view(bytes).substr(static_cast<size_t>(n - 1) * 170, 170);
-  };
-  // A header every 257 records (a header, its second record and up to 255 lines), held
-  // while the scan reads on across every block boundary.
+  // A header every 257 records (a header, its second record and up to 255 lines).
   int64_t held = 1;
   std::string_view head = f.Record(1);
   for (int64_t n = 2; n <= count; ++n) {
-    ASSERT_EQ(f.Record(n), expected(n)) << n;
-    ASSERT_EQ(head, expected(held)) << "header " << held << " after reading " << n;
-    if ((n - 1) % 257 == 0) {
-      held = n;
-      head = f.Record(n);
-    }
+    ASSERT_EQ(f.Record(n), RecordIn(docs, n, 170)) << n;
+    ASSERT_EQ(head, RecordIn(docs, held, 170)) << "header " << held << " after reading " << n;
+    if ((n - 1) % 257 == 0) head = f.Record(held = n);
   }
-}
 
-TEST_F(HostFileTest, RecordLongerThanTheWindowIsReadWhole) {
-  const size_t length = (1u << 20) + 7;
-  const std::string bytes = Records(2, length);
-  Write("big.fix", bytes);
-  HostRecordFile f(dir_, "big.fix", length);
-  EXPECT_EQ(f.Record(2), std::string_view(bytes).substr(length, length));
-  EXPECT_EQ(f.Record(1), std::string_view(bytes).substr(0, length));
+  const size_t huge = (1u << 20) + 7;
+  const std::string big = Records(2, huge);
+  Write("big.fix", big);
+  HostRecordFile b(dir_, "big.fix", huge);
+  EXPECT_EQ(b.Record(2), RecordIn(big, 2, huge));
+  EXPECT_EQ(b.Record(1), RecordIn(big, 1, huge));
 }
 
 TEST_F(HostFileTest, FileCutByTheHostDuringAScanReadsAsEmpty) {
@@ -167,87 +119,55 @@ TEST_F(HostFileTest, FileCutByTheHostDuringAScanReadsAsEmpty) {
   EXPECT_TRUE(f.Record(10).empty());
 }
 
-TEST_F(HostFileTest, HighBytesAndZerosArePassedThrough) {
-  std::string rec = std::string("\x01\x80\x9a\xff", 4) + std::string(3, '\0') + " ";
-  Write("ADF.FIX", rec);
-  HostRecordFile f(dir_, "ADF.FIX", 8);
-  EXPECT_EQ(f.Record(1), rec);
-}
-
 TEST_F(HostFileTest, OpenIsReadOnlyAndLeavesTheFileUntouched) {
   fs::path p = Write("ACT.fix", Records(2, 650));
   fs::permissions(p, fs::perms::owner_read | fs::perms::group_read | fs::perms::others_read);
   auto before = fs::last_write_time(p);
-  {
-    HostRecordFile f(dir_, "ACT.fix", 650);
-    EXPECT_EQ(f.Record(2).substr(0, 2), "2:");
-  }
+  EXPECT_EQ(HostRecordFile(dir_, "ACT.fix", 650).Record(2).substr(0, 2), "2:");
   EXPECT_EQ(fs::last_write_time(p), before);
   EXPECT_EQ(fs::file_size(p), 1300u);
   fs::permissions(p, fs::perms::owner_all);
 }
 
-class FindFileNoCaseTest : public HostFileTest {};
-
-TEST_F(FindFileNoCaseTest, MatchesWhateverCaseTheHostUsed) {
-  Write("ACT.FIX", "x");
-  auto found = FindFileNoCase(dir_, "ACT.fix");
-  ASSERT_TRUE(found);
-  EXPECT_EQ(found->filename(), "ACT.FIX");
-  EXPECT_EQ(FindFileNoCase(dir_, "act.fix")->filename(), "ACT.FIX");
-  HostRecordFile f(dir_, "act.FIX", 1);
-  EXPECT_EQ(f.Record(1), "x");
-}
-
-TEST_F(FindFileNoCaseTest, ExactMatchWinsOverOtherCases) {
+// An exact match wins; else the name first by bytes; the host's leading backslash is
+// ignored; only whole names of plain files match.
+TEST_F(HostFileTest, FindFileNoCase) {
   Write("ACT.FIX", "upper");
   Write("act.fix", "lower");
   Write("Act.Fix", "mixed");
-  EXPECT_EQ(FindFileNoCase(dir_, "act.fix")->filename(), "act.fix");
-  EXPECT_EQ(FindFileNoCase(dir_, "ACT.FIX")->filename(), "ACT.FIX");
-  EXPECT_EQ(FindFileNoCase(dir_, "Act.Fix")->filename(), "Act.Fix");
-  // No exact match: the choice is the same on every run (first by bytes).
-  EXPECT_EQ(FindFileNoCase(dir_, "ACT.fix")->filename(), "ACT.FIX");
-  HostRecordFile f(dir_, "act.fix", 5);
-  EXPECT_EQ(f.Record(1), "lower");
-}
-
-TEST_F(FindFileNoCaseTest, HostStyleLeadingBackslashIsIgnored) {
   Write("IMV.FIX", "y");
-  EXPECT_EQ(FindFileNoCase(dir_, "\\IMV.FIX")->filename(), "IMV.FIX");
-  EXPECT_EQ(FindFileNoCase(dir_, "\\imv.fix")->filename(), "IMV.FIX");
-}
-
-TEST_F(FindFileNoCaseTest, FoldersAreNotFiles) {
-  fs::create_directories(dir_ / "act.fix");
-  EXPECT_FALSE(FindFileNoCase(dir_, "ACT.fix"));
-  EXPECT_FALSE(FindFileNoCase(dir_, "act.fix"));
-  Write("ACT.FIX", "z");
-  EXPECT_EQ(FindFileNoCase(dir_, "act.fix")->filename(), "ACT.FIX");
-}
-
-TEST_F(FindFileNoCaseTest, OnlyWholeNamesMatch) {
   Write("a12.tmp", "1");
-  EXPECT_FALSE(FindFileNoCase(dir_, "a1.tmp"));
-  EXPECT_FALSE(FindFileNoCase(dir_, "a12.tmp2"));
-  EXPECT_FALSE(FindFileNoCase(dir_, ""));
-}
-
-TEST_F(FindFileNoCaseTest, MissingFolderFindsNothingAndOpenNamesTheFile) {
-  fs::path missing = dir_ / "no_such_company";
-  EXPECT_FALSE(FindFileNoCase(missing, "ACT.fix"));
-  try {
-    HostRecordFile f(missing, "ACT.fix", 650);
-    FAIL() << "opened a file in a missing folder";
-  } catch (const HostFileError& e) {
-    EXPECT_NE(std::string(e.what()).find("ACT.fix"), std::string::npos) << e.what();
-    EXPECT_NE(std::string(e.what()).find("no_such_company"), std::string::npos) << e.what();
+  fs::create_directories(dir_ / "itm.fix");
+  const std::pair<const char*, const char*> cases[] = {
+      {"act.fix", "act.fix"},
+      {"ACT.FIX", "ACT.FIX"},
+      {"Act.Fix", "Act.Fix"},
+      {"ACT.fix", "ACT.FIX"},
+      {"\\IMV.FIX", "IMV.FIX"},
+      {"\\imv.fix", "IMV.FIX"},
+      {"imv.FIX", "IMV.FIX"},
+      {"ITM.fix", nullptr},
+      {"a1.tmp", nullptr},
+      {"a12.tmp2", nullptr},
+      {"", nullptr},
+  };
+  for (const auto& [name, found] : cases) {
+    const auto path = FindFileNoCase(dir_, name);
+    EXPECT_EQ(path ? path->filename().string() : "-", found ? found : "-") << name;
   }
+  EXPECT_EQ(HostRecordFile(dir_, "act.fix", 5).Record(1), "lower");
+  EXPECT_EQ(HostRecordFile(dir_, "imv.FIX", 1).Record(1), "y");
+  EXPECT_FALSE(FindFileNoCase(dir_ / "no_such_company", "ACT.fix"));
 }
 
 TEST_F(HostFileTest, MissingOrUnreadableFilesRaiseHostFileError) {
+  try {
+    HostRecordFile f(dir_ / "no_such_company", "ACT.fix", 650);
+    FAIL() << "opened a file in a missing folder";
+  } catch (const HostFileError& e) {
+    EXPECT_NE(std::string(e.what()).find("no_such_company/ACT.fix"), std::string::npos) << e.what();
+  }
   EXPECT_THROW(HostRecordFile(dir_, "ITM.fix", 500), HostFileError);
-  EXPECT_THROW(HostRecordFile(dir_ / "ITM.fix", 500), HostFileError);
   EXPECT_THROW(HostRecordFile(dir_, 650), HostFileError);  // a folder
   // A FIFO in a file's place is refused at once, never waited on.
   ASSERT_EQ(::mkfifo((dir_ / "ACT.fix").c_str(), 0600), 0);
@@ -264,21 +184,12 @@ TEST_F(HostFileTest, MissingOrUnreadableFilesRaiseHostFileError) {
 }
 
 TEST(RoundHalfEvenTest, HalvesGoToTheEvenNeighbour) {
-  EXPECT_EQ(RoundHalfEven(0.5), 0);
-  EXPECT_EQ(RoundHalfEven(1.5), 2);
-  EXPECT_EQ(RoundHalfEven(2.5), 2);
-  EXPECT_EQ(RoundHalfEven(3.5), 4);
-  EXPECT_EQ(RoundHalfEven(-0.5), 0);
-  EXPECT_EQ(RoundHalfEven(-1.5), -2);
-  EXPECT_EQ(RoundHalfEven(-2.5), -2);
-  EXPECT_EQ(RoundHalfEven(2.4999), 2);
-  EXPECT_EQ(RoundHalfEven(2.5001), 3);
-  EXPECT_EQ(RoundHalfEven(-1.0), -1);
-  EXPECT_EQ(RoundHalfEven(0.0), 0);
-  // A ten-record account file: the last record read is 10 - 1 = 9.
-  EXPECT_EQ(RoundHalfEven(6500.0 / 650.0 - 1), 9);
-  EXPECT_EQ(RoundHalfEven(std::nan("")), 0);
-  EXPECT_EQ(RoundHalfEven(1e300), std::numeric_limits<int64_t>::max());
+  const std::pair<double, int64_t> cases[] = {
+      {0.5, 0},    {1.5, 2},   {2.5, 2},          {3.5, 4},
+      {-0.5, 0},   {-1.5, -2}, {-2.5, -2},        {2.4999, 2},
+      {2.5001, 3}, {-1.0, -1}, {std::nan(""), 0}, {1e300, std::numeric_limits<int64_t>::max()},
+  };
+  for (const auto& [x, rounded] : cases) EXPECT_EQ(RoundHalfEven(x), rounded) << x;
 }
 
 }  // namespace

@@ -3,7 +3,6 @@
 
 #include <gtest/gtest.h>
 
-#include <algorithm>
 #include <array>
 #include <functional>
 #include <string>
@@ -11,39 +10,26 @@
 
 #include "control/panel.h"
 #include "import/importers.h"
-#include "importtest.h"
+#include "support/importtest.h"
 #include "zdrgen/generator.h"
 
 namespace zdr {
 namespace {
 
-using test::ImportTest;
 using Strings = std::vector<std::string>;
+using Keys = std::array<std::string, 4>;
 using zdrgen::HostDate;
 
-zdrgen::LedgerFields Tx(int16_t journal, std::string type, std::array<std::string, 4> keys,
+zdrgen::LedgerFields Tx(int16_t journal, std::string type, Keys keys,
                         HostDate date = HostDate::Of(2020, 6, 15),
                         HostDate valueDate = HostDate::Of(2020, 6, 15)) {
-  zdrgen::LedgerFields f;
-  f.journal = journal;
-  f.type = std::move(type);
-  f.keys = std::move(keys);
-  f.date = date;
-  f.valueDate = valueDate;
-  return f;
+  return {journal, std::move(type), std::move(keys), date, valueDate};
+}
+zdrgen::BatchFields Bx(std::string type, Keys keys, HostDate date = HostDate::Of(2020, 6, 15)) {
+  return {std::move(type), std::move(keys), date, date};
 }
 
-zdrgen::BatchFields Bx(std::string type, std::array<std::string, 4> keys,
-                       HostDate date = HostDate::Of(2020, 6, 15)) {
-  zdrgen::BatchFields f;
-  f.type = std::move(type);
-  f.keys = std::move(keys);
-  f.date = date;
-  f.valueDate = date;
-  return f;
-}
-
-class LedgerImport : public ImportTest {
+class LedgerImport : public test::ImportTest {
  protected:
   void SetUp() override {
     ImportTest::SetUp();
@@ -60,327 +46,212 @@ class LedgerImport : public ImportTest {
     Write(name, recs);
   }
   int16_t Run() { return ReadTransactions(company_, db_, panel_, seam_); }
-  // "FileID|TransID|AccountKey", sorted.
+  void RunBatches() { ReadAllTempTrans(company_, db_, panel_, seam_); }
+  // "FileID|TransID|AccountKey" in that order.
   Strings Transacts() {
-    Strings rows = Rows(db_, "SELECT FileID, TransID, AccountKey FROM tTransact");
-    std::sort(rows.begin(), rows.end());
-    return rows;
+    return Rows(db_,
+                "SELECT FileID, TransID, AccountKey FROM tTransact ORDER BY FileID, "
+                "TransID, AccountKey");
   }
-  Strings TransIds() {
-    return Rows(db_, "SELECT DISTINCT TransID FROM tTransact ORDER BY TransID");
+  Strings Column(const char* sql) { return Rows(db_, sql); }
+  void ExpectOneFault() {
+    ASSERT_EQ(seam_.messages.size(), 1u);
+    EXPECT_EQ(seam_.messages[0].title, "תקלה");
+    EXPECT_EQ(seam_.messages[0].icon, MsgIcon::Information);
+    seam_.messages.clear();
   }
 
   Panel panel_;
   std::string db_;
 };
 
-TEST_F(LedgerImport, EveryEntryWithoutCriteria) {
-  WriteLedger({Tx(1, "AB", {"K1", "", "K2", ""}), Tx(2, "AB", {"", "", "", ""}),
-               Tx(3, "AB", {"", "", "", "K3"}), Tx(4, "AB", {"K4", "K4", "K5", "K4"})});
+TEST_F(LedgerImport, OneRowPerDistinctKeyReversedMirroredAndTrimmed) {
+  WriteLedger({Tx(1, "AB", {"K1", "", "(12", ""}), Tx(-2, "AB", {"", "", "", ""}),
+               Tx(3, "AB", {"", "", "", test::HostText("אבג", 8)}),
+               Tx(4, "AB", {"K4", "K4", "K5", "K4"})});
   EXPECT_EQ(Run(), -1);
   EXPECT_TRUE(seam_.messages.empty());
-  EXPECT_EQ(Transacts(), (Strings{"-1|1|1K", "-1|1|2K", "-1|3|3K", "-1|4|4K", "-1|4|5K"}));
+  EXPECT_EQ(Transacts(), (Strings{"-1|1|1K", "-1|1|21)", "-1|3|אבג", "-1|4|4K", "-1|4|5K"}));
 }
 
-TEST_F(LedgerImport, KeyIsReversedMirroredAndTrimmed) {
-  WriteLedger({Tx(1, "AB", {"(12", test::HostText("אבג", 8), "", ""})});
-  Run();
-  EXPECT_EQ(Transacts(), (Strings{"-1|1|21)", "-1|1|אבג"}));
-}
-
-TEST_F(LedgerImport, JournalBoundsInclusive) {
-  WriteLedger({Tx(4, "A", {"K", "", "", ""}), Tx(5, "A", {"K", "", "", ""}),
-               Tx(7, "A", {"K", "", "", ""}), Tx(8, "A", {"K", "", "", ""}),
-               Tx(-3, "A", {"K", "", "", ""})});
-  panel_.ChkJournal = 1;
-  panel_.txtFromJournal = "5";
-  panel_.txtToJournal = "7";
-  Run();
-  EXPECT_EQ(TransIds(), (Strings{"2", "3"}));
-}
-
-TEST_F(LedgerImport, JournalFromBoundOnlyAndBoxOff) {
-  WriteLedger({Tx(4, "A", {"K", "", "", ""}), Tx(5, "A", {"K", "", "", ""})});
-  panel_.txtFromJournal = "5";
-  Run();
-  EXPECT_EQ(TransIds(), (Strings{"1", "2"}));
-  db_ = WorkDb();
-  panel_.ChkJournal = 1;
-  Run();
-  EXPECT_EQ(TransIds(), (Strings{"2"}));
-}
-
-// A bound that is not a number, not 16 bits or not a date stops the import before any row.
-TEST_F(LedgerImport, BadBoundIsFault) {
-  WriteLedger({Tx(4, "A", {"K", "", "", ""})});
-  const std::vector<std::function<void(Panel&)>> bad = {
-      [](Panel& p) { p.ChkJournal = 1, p.txtToJournal = "x1"; },
-      [](Panel& p) { p.ChkJournal = 1, p.txtFromJournal = "40000"; },
-      [](Panel& p) { p.chkTransVDate = 1, p.txtFromTransVDate = "yesterday"; }};
-  for (size_t i = 0; i < bad.size(); ++i) {
+// Each case sets criteria on a fresh panel and names the transactions that pass.
+TEST_F(LedgerImport, JournalTypeAndDateCriteria) {
+  const Keys k = {"K", "", "", ""};
+  // Types "AB", "A", "B", "7", "ab", "אב" (Hebrew in display order).
+  WriteLedger({Tx(4, "AB", k, HostDate::Of(2020, 1, 1), HostDate::Of(2020, 5, 1)),
+               Tx(5, "A", k, HostDate::Of(2020, 1, 31), HostDate::Of(2020, 5, 1)),
+               Tx(7, "B", k, HostDate::Of(2020, 2, 1), HostDate::Of(2020, 5, 1)),
+               Tx(8, "7", k, HostDate::Of(2020, 1, 15), HostDate::Of(2020, 4, 30)),
+               Tx(-3, "ab", k, HostDate::Of(2020, 1, 15), HostDate::Of(2020, 6, 1)),
+               Tx(6, test::HostText("אב", 3), k, HostDate::Of(1999, 1, 1))});
+  auto type = [](const char* pattern) {
+    return [pattern](Panel& p) { p.chkTransType = 1, p.txtTransType = pattern; };
+  };
+  const std::pair<std::function<void(Panel&)>, Strings> cases[] = {
+      {[](Panel& p) { p.ChkJournal = 1, p.txtFromJournal = "5", p.txtToJournal = "7"; },
+       {"2", "3", "6"}},
+      {[](Panel& p) { p.ChkJournal = 1, p.txtFromJournal = "5"; }, {"2", "3", "4", "6"}},
+      {[](Panel& p) { p.txtFromJournal = "5"; }, {"1", "2", "3", "4", "5", "6"}},
+      {type("*"), {"1", "2", "3", "4", "5", "6"}},
+      {type("?"), {"2", "3", "4"}},
+      {type("#"), {"4"}},
+      {type("[A-C]"), {"2", "3"}},
+      {type("[!A]"), {"3", "4"}},
+      {type("A*"), {"1", "2"}},
+      {type("אב"), {"6"}},
+      {type("א?"), {"6"}},
+      // Regression: the spaced conversion ends a Latin or digit type with a space, so a
+      // pattern typed as the type reads never matched it. The converted form still matches.
+      {type("AB"), {"1"}},
+      {type("# "), {"4"}},
+      {[](Panel& p) {
+         p.chkTransDates = 1, p.txtFromTransDate = "1/1/20", p.txtToTransDate = "31/01/2020";
+         p.chkTransVDate = 1, p.txtFromTransVDate = "01/05/2020", p.txtToTransVDate = "31/5/20";
+       },
+       {"1", "2"}},
+      {[](Panel& p) { p.chkTransDates = 1, p.txtFromTransDate = "", p.txtToTransDate = ""; },
+       {"1", "2", "3", "4", "5", "6"}},
+  };
+  for (const auto& [set, ids] : cases) {
     panel_ = Panel{};
-    bad[i](panel_);
-    seam_.messages.clear();
-    EXPECT_EQ(Run(), 0) << i;
-    ASSERT_EQ(seam_.messages.size(), 1u) << i;
-    EXPECT_EQ(seam_.messages[0].title, "תקלה");
-    EXPECT_EQ(seam_.messages[0].icon, MsgIcon::Information);
-    EXPECT_EQ(Count(db_, "tTransact"), 0);
+    set(panel_);
+    db_ = WorkDb();
+    Run();
+    EXPECT_TRUE(seam_.messages.empty());
+    EXPECT_EQ(Column("SELECT TransID FROM tTransact ORDER BY TransID"), ids)
+        << panel_.txtTransType << " " << panel_.txtFromJournal;
   }
 }
 
-struct PatternCase {
-  std::string pattern;
-  Strings transIds;
-};
-
-class LedgerTypePattern : public LedgerImport, public ::testing::WithParamInterface<PatternCase> {};
-
-TEST_P(LedgerTypePattern, MatchesTheWholeConvertedType) {
-  // Types 1..6: "AB", "A", "B", "7", "ab", "אב" (Hebrew in display order).
-  WriteLedger({Tx(1, "AB", {"K", "", "", ""}), Tx(1, "A", {"K", "", "", ""}),
-               Tx(1, "B", {"K", "", "", ""}), Tx(1, "7", {"K", "", "", ""}),
-               Tx(1, "ab", {"K", "", "", ""}), Tx(1, test::HostText("אב", 3), {"K", "", "", ""})});
-  panel_.chkTransType = 1;
-  panel_.txtTransType = GetParam().pattern;
-  Run();
-  EXPECT_TRUE(seam_.messages.empty());
-  EXPECT_EQ(TransIds(), GetParam().transIds);
-}
-
-INSTANTIATE_TEST_SUITE_P(Patterns, LedgerTypePattern,
-                         ::testing::Values(PatternCase{"*", {"1", "2", "3", "4", "5", "6"}},
-                                           PatternCase{"?", {"2", "3", "4"}},
-                                           PatternCase{"#", {"4"}},
-                                           PatternCase{"[A-C]", {"2", "3"}},
-                                           PatternCase{"[!A]", {"3", "4"}},
-                                           PatternCase{"AB", {"1"}}, PatternCase{"A*", {"1", "2"}},
-                                           PatternCase{"אב", {"6"}}, PatternCase{"א?", {"6"}}));
-
-// Regression: the spaced conversion ends a Latin or digit type with a space, so a pattern typed
-// as the type reads ("AB", "#") never matched it.
-TEST_F(LedgerImport, PatternMatchesLatinTypeWithoutItsTrailingSpace) {
-  WriteLedger({Tx(1, "AB", {"K", "", "", ""}), Tx(1, "7", {"K", "", "", ""})});
-  panel_.chkTransType = 1;
-  panel_.txtTransType = "AB";
-  Run();
-  EXPECT_EQ(TransIds(), Strings{"1"});
-  db_ = WorkDb();
-  panel_.txtTransType = "# ";  // the converted form with its space still matches
-  Run();
-  EXPECT_EQ(TransIds(), Strings{"2"});
-}
-
-TEST_F(LedgerImport, DateAndValueDateRangesInclusive) {
-  WriteLedger({Tx(1, "A", {"K", "", "", ""}, HostDate::Of(2020, 1, 1), HostDate::Of(2020, 5, 1)),
-               Tx(1, "A", {"K", "", "", ""}, HostDate::Of(2020, 1, 31), HostDate::Of(2020, 5, 1)),
-               Tx(1, "A", {"K", "", "", ""}, HostDate::Of(2020, 2, 1), HostDate::Of(2020, 5, 1)),
-               Tx(1, "A", {"K", "", "", ""}, HostDate::Of(2020, 1, 15), HostDate::Of(2020, 4, 30)),
-               Tx(1, "A", {"K", "", "", ""}, HostDate::Of(2020, 1, 15), HostDate::Of(2020, 6, 1))});
-  panel_.chkTransDates = 1;
-  panel_.txtFromTransDate = "1/1/20";
-  panel_.txtToTransDate = "31/01/2020";
-  panel_.chkTransVDate = 1;
-  panel_.txtFromTransVDate = "01/05/2020";
-  panel_.txtToTransVDate = "31/5/20";
-  Run();
-  EXPECT_EQ(TransIds(), (Strings{"1", "2"}));
-}
-
-TEST_F(LedgerImport, EmptyDateTextsAreNoBound) {
-  WriteLedger({Tx(1, "A", {"K", "", "", ""}, HostDate::Of(1999, 1, 1))});
-  panel_.chkTransDates = 1;
-  panel_.txtFromTransDate = "";
-  panel_.txtToTransDate = "";
-  Run();
-  EXPECT_EQ(TransIds(), Strings{"1"});
-}
-
-TEST_F(LedgerImport, MissingFileIsFault) {
+// A bound that is not a number, not 16 bits or not a date stops the import before any row;
+// so does a missing file. A ragged file is reported after the rows before it.
+TEST_F(LedgerImport, FaultsKeepTheRowsBeforeThem) {
+  const std::function<void(Panel&)> bad[] = {
+      [](Panel& p) { p.ChkJournal = 1, p.txtToJournal = "x1"; },
+      [](Panel& p) { p.ChkJournal = 1, p.txtFromJournal = "40000"; },
+      [](Panel& p) { p.chkTransVDate = 1, p.txtFromTransVDate = "yesterday"; }};
+  for (const auto& set : bad) {
+    WriteLedger({Tx(4, "A", {"K", "", "", ""})});
+    panel_ = Panel{};
+    set(panel_);
+    EXPECT_EQ(Run(), 0);
+    ExpectOneFault();
+  }
+  EXPECT_EQ(Count(db_, "tTransact"), 0);
+  std::filesystem::remove(std::filesystem::path(company_) / "amv.fix");
   EXPECT_EQ(Run(), 0);
-  ASSERT_EQ(seam_.messages.size(), 1u);
-  EXPECT_EQ(seam_.messages[0].title, "תקלה");
-  EXPECT_EQ(seam_.messages[0].icon, MsgIcon::Information);
+  ExpectOneFault();
 }
 
-TEST_F(LedgerImport, RaggedFileReportsAndKeepsEarlierRows) {
-  WriteLedger({Tx(1, "A", {"K1", "", "", ""}), Tx(1, "A", {"K2", "", "", ""})});
-  AppendBytes("amv.fix", std::string(120, ' '));
-  EXPECT_EQ(Run(), 0);
-  ASSERT_EQ(seam_.messages.size(), 1u);
-  EXPECT_EQ(seam_.messages[0].title, "תקלה");
-  EXPECT_EQ(Transacts(), (Strings{"-1|1|1K", "-1|2|2K"}));
-}
-
-TEST_F(LedgerImport, ProgressEveryFifthRecord) {
-  std::vector<zdrgen::LedgerFields> txs(10, Tx(1, "A", {"K", "", "", ""}));
-  WriteLedger(txs);
+TEST_F(LedgerImport, RaggedFileReportsAfterTheRowsBeforeAndProgressEveryFifth) {
+  WriteLedger(std::vector<zdrgen::LedgerFields>(10, Tx(1, "A", {"K", "", "", ""})));
   seam_.progress.clear();
   Run();
   EXPECT_EQ(seam_.progress, (std::vector<int>{0, 1500, 3000, 0}));
+  db_ = WorkDb();
+  WriteLedger({Tx(1, "A", {"K1", "", "", ""}), Tx(1, "A", {"K2", "", "", ""})});
+  AppendBytes("amv.fix", std::string(120, ' '));
+  EXPECT_EQ(Run(), 0);
+  ExpectOneFault();
+  EXPECT_EQ(Transacts(), (Strings{"-1|1|1K", "-1|2|2K"}));
 }
 
 // ---- Temporary batches.
 
-TEST_F(LedgerImport, BatchInRangeCarriesItsNumber) {
-  WriteBatch("a12.tmp", {Bx("A", {"K1", "", "K2", ""}), Bx("A", {"", "", "", ""})});
-  panel_.ChkJournal = 1;
-  panel_.txtFromJournal = "10";
-  panel_.txtToJournal = "20";
-  ReadAllTempTrans(company_, db_, panel_, seam_);
-  EXPECT_TRUE(seam_.messages.empty());
-  EXPECT_EQ(Transacts(), (Strings{"12|1|1K", "12|1|2K"}));
-  db_ = WorkDb();
-  panel_.txtFromJournal = "13";
-  ReadAllTempTrans(company_, db_, panel_, seam_);
-  EXPECT_EQ(Count(db_, "tTransact"), 0);
-}
-
-TEST_F(LedgerImport, BatchFromBoundOnlyReadsEveryBatchUpFromIt) {
-  WriteBatch("a3.tmp", {Bx("A", {"K3", "", "", ""})});
-  WriteBatch("a5.tmp", {Bx("A", {"K5", "", "", ""})});
-  WriteBatch("A900.TMP", {Bx("A", {"K9", "", "", ""})});
-  panel_.ChkJournal = 1;
-  panel_.txtFromJournal = "5";
-  ReadAllTempTrans(company_, db_, panel_, seam_);
-  EXPECT_EQ(Transacts(), (Strings{"5|1|5K", "900|1|9K"}));
-}
-
-TEST_F(LedgerImport, NamesWithoutANumberAndBatchZeroAreNeverRead) {
-  for (const char* name : {"a0.tmp", "a.tmp", "abc.tmp", "b7.tmp", "a7.tmpx"}) {
-    WriteBatch(name, {Bx("A", {"K", "", "", ""})});
+// Regressions: a012.tmp used to be read as the file a12.tmp, and a batch number past 16 bits
+// used to end the whole data load.
+TEST_F(LedgerImport, WhichBatchesAreRead) {
+  for (const char* name : {"a3.tmp", "a5.tmp", "A900.TMP", "a012.tmp", "a99999.tmp", "a0.tmp",
+                           "a.tmp", "abc.tmp", "b7.tmp", "a7.tmpx"}) {
+    WriteBatch(name, {Bx("A", {"K1", "", "K2", ""}), Bx("A", {"", "", "", ""})});
   }
   std::filesystem::create_directory(std::filesystem::path(company_) / "a8.tmp");
-  ReadAllTempTrans(company_, db_, panel_, seam_);
-  EXPECT_TRUE(seam_.messages.empty());
-  EXPECT_EQ(Count(db_, "tTransact"), 0);
-}
-
-// Regression: a012.tmp used to be read as the file a12.tmp.
-TEST_F(LedgerImport, BatchWithLeadingZerosReadsTheListedFile) {
-  WriteBatch("a012.tmp", {Bx("A", {"K1", "", "", ""})});
-  ReadAllTempTrans(company_, db_, panel_, seam_);
-  EXPECT_TRUE(seam_.messages.empty());
-  EXPECT_EQ(Transacts(), Strings{"12|1|1K"});
-}
-
-// Regression: a batch number past 16 bits used to end the whole data load.
-TEST_F(LedgerImport, BatchNumberBeyond16BitsIsPassedOver) {
-  WriteBatch("a99999.tmp", {Bx("A", {"K9", "", "", ""})});
-  WriteBatch("a4.tmp", {Bx("A", {"K4", "", "", ""})});
-  EXPECT_NO_THROW(ReadAllTempTrans(company_, db_, panel_, seam_));
-  EXPECT_EQ(Transacts(), Strings{"4|1|4K"});
+  const std::pair<std::function<void(Panel&)>, Strings> cases[] = {
+      {[](Panel&) {}, {"3", "5", "12", "900"}},
+      {[](Panel& p) { p.ChkJournal = 1, p.txtFromJournal = "5"; }, {"5", "12", "900"}},
+      {[](Panel& p) { p.ChkJournal = 1, p.txtFromJournal = "10", p.txtToJournal = "20"; }, {"12"}},
+      {[](Panel& p) { p.ChkJournal = 1, p.txtFromJournal = "13", p.txtToJournal = "20"; }, {}},
+  };
+  for (const auto& [set, files] : cases) {
+    panel_ = Panel{};
+    set(panel_);
+    db_ = WorkDb();
+    EXPECT_NO_THROW(RunBatches());
+    EXPECT_TRUE(seam_.messages.empty());
+    EXPECT_EQ(Column("SELECT DISTINCT FileID FROM tTransact ORDER BY FileID"), files);
+  }
+  EXPECT_EQ(Transacts(), Strings{});
+  db_ = WorkDb();
+  EXPECT_EQ(ReadTempTransactions(company_, db_, 12, "a012.tmp", panel_, seam_), -1);
+  EXPECT_EQ(Transacts(), (Strings{"12|1|1K", "12|1|2K"}));
 }
 
 TEST_F(LedgerImport, BatchAppliesTypeAndDatesButNotTheJournalRangeInside) {
   WriteBatch("a6.tmp", {Bx("AB", {"K1", "", "", ""}), Bx("CD", {"K2", "", "", ""}),
                         Bx("AB", {"K3", "", "", ""}, HostDate::Of(2019, 1, 1))});
+  panel_.ChkJournal = 1;
+  panel_.txtFromJournal = "7";
   panel_.chkTransType = 1;
   panel_.txtTransType = "A*";
   panel_.chkTransDates = 1;
   panel_.txtFromTransDate = "1/1/2020";
-  panel_.txtToTransDate = "";
   EXPECT_EQ(ReadTempTransactions(company_, db_, 6, panel_, seam_), -1);
   EXPECT_EQ(Transacts(), Strings{"6|1|1K"});
 }
 
-TEST_F(LedgerImport, MissingBatchIsFaultAndListingGoesOn) {
+TEST_F(LedgerImport, BatchFaults) {
   EXPECT_EQ(ReadTempTransactions(company_, db_, 44, panel_, seam_), 0);
-  ASSERT_EQ(seam_.messages.size(), 1u);
-  EXPECT_EQ(seam_.messages[0].title, "תקלה");
-  EXPECT_EQ(seam_.messages[0].icon, MsgIcon::Information);
-}
-
-TEST_F(LedgerImport, RaggedBatchIsReportedAndOthersStillRead) {
+  ExpectOneFault();
   WriteBatch("a1.tmp", {Bx("A", {"K1", "", "", ""})});
   AppendBytes("a1.tmp", std::string(200, ' '));
   WriteBatch("a2.tmp", {Bx("A", {"K2", "", "", ""})});
-  ReadAllTempTrans(company_, db_, panel_, seam_);
-  EXPECT_EQ(seam_.messages.size(), 1u);
+  RunBatches();
+  ExpectOneFault();
   EXPECT_EQ(Transacts(), (Strings{"1|1|1K", "2|1|2K"}));
-}
-
-TEST_F(LedgerImport, NonNumericJournalBoundEscapesTheBatchListing) {
-  WriteBatch("a1.tmp", {Bx("A", {"K1", "", "", ""})});
+  // A journal bound that is not a number escapes the listing.
   panel_.ChkJournal = 1;
   panel_.txtFromJournal = "x";
-  EXPECT_ANY_THROW(ReadAllTempTrans(company_, db_, panel_, seam_));
+  EXPECT_ANY_THROW(RunBatches());
 }
 
 // ---- Cash receipts.
 
-class CashImport : public LedgerImport {
- protected:
-  void WriteCash(const std::vector<std::pair<std::string, HostDate>>& receipts) {
-    std::vector<std::string> recs;
-    for (const auto& [key, date] : receipts) {
-      zdrgen::CashFields f;
-      f.accountKey = key;
-      f.date = date;
-      recs.push_back(zdrgen::CashRecord(f));
-    }
-    Write("icash2.fix", recs);
+TEST_F(LedgerImport, CashReceipts) {
+  const std::pair<const char*, HostDate> receipts[] = {{"A", HostDate::Of(2008, 12, 31)},
+                                                       {"B", HostDate::Of(2009, 1, 1)},
+                                                       {"C", HostDate::Of(2009, 1, 2)},
+                                                       {"", HostDate::Of(2009, 1, 2)},
+                                                       {"(K5", HostDate::Of(2009, 1, 3)}};
+  std::vector<std::string> recs;
+  for (const auto& [key, date] : receipts) recs.push_back(zdrgen::CashRecord({key, date}));
+  Write("icash2.fix", recs);
+  const std::pair<std::function<void(Panel&)>, Strings> cases[] = {
+      {[](Panel&) {}, {"1|A", "2|B", "3|C", "5|5K)"}},
+      // Five characters: no bound for documents, but a bound here.
+      {[](Panel& p) { p.ChkDates = 1, p.TxtFromDate = "1/1/9", p.TxtToDate = "2/1/09"; },
+       {"2|B", "3|C"}},
+      {[](Panel& p) { p.TxtFromDate = "1/1/2010"; }, {"1|A", "2|B", "3|C", "5|5K)"}},
+      {[](Panel& p) { p.ChkDates = 1; }, {"1|A", "2|B", "3|C", "5|5K)"}},
+  };
+  for (const auto& [set, rows] : cases) {
+    panel_ = Panel{};
+    set(panel_);
+    db_ = WorkDb();
+    EXPECT_EQ(ReadCash(company_, db_, panel_, seam_), -1);
+    EXPECT_EQ(Column("SELECT TransID, AccountKey FROM tCash ORDER BY TransID"), rows);
   }
-  int16_t RunCash() { return ReadCash(company_, db_, panel_, seam_); }
-  Strings Cash() {
-    Strings rows = Rows(db_, "SELECT TransID, AccountKey FROM tCash");
-    std::sort(rows.begin(), rows.end());
-    return rows;
-  }
-};
-
-TEST_F(CashImport, WithoutBoundsEveryKeyedReceipt) {
-  WriteCash({{"K1", HostDate::Of(1990, 1, 1)},
-             {"", HostDate::Of(2020, 1, 1)},
-             {"(K3", HostDate::Of(2030, 1, 1)}});
-  EXPECT_EQ(RunCash(), -1);
-  EXPECT_EQ(Cash(), (Strings{"1|1K", "3|3K)"}));
-}
-
-TEST_F(CashImport, DateBoundsInclusiveAnyTextCounts) {
-  WriteCash({{"A", HostDate::Of(2008, 12, 31)},
-             {"B", HostDate::Of(2009, 1, 1)},
-             {"C", HostDate::Of(2009, 1, 2)},
-             {"D", HostDate::Of(2009, 1, 3)}});
-  panel_.ChkDates = 1;
-  panel_.TxtFromDate = "1/1/9";  // five characters: no bound for documents, a bound here
-  panel_.TxtToDate = "2/1/09";
-  RunCash();
-  EXPECT_EQ(Cash(), (Strings{"2|B", "3|C"}));
-}
-
-TEST_F(CashImport, DateBoxOffOrEmptyTextsAreNoBound) {
-  WriteCash({{"A", HostDate::Of(1950, 1, 1)}});
-  panel_.TxtFromDate = "1/1/2000";
-  RunCash();
-  EXPECT_EQ(Count(db_, "tCash"), 1);
-  db_ = WorkDb();
-  panel_.ChkDates = 1;
-  panel_.TxtFromDate = "";
-  panel_.TxtToDate = "";
-  RunCash();
-  EXPECT_EQ(Count(db_, "tCash"), 1);
-}
-
-TEST_F(CashImport, MissingFileAndBadDateAreFaults) {
-  EXPECT_EQ(RunCash(), 0);
-  WriteCash({{"A", HostDate::Of(2020, 1, 1)}});
-  panel_.ChkDates = 1;
   panel_.TxtToDate = "12-12";
-  EXPECT_EQ(RunCash(), 0);
-  ASSERT_EQ(seam_.messages.size(), 2u);
-  for (const auto& m : seam_.messages) {
-    EXPECT_EQ(m.title, "תקלה");
-    EXPECT_EQ(m.icon, MsgIcon::Information);
-  }
-  EXPECT_EQ(Count(db_, "tCash"), 0);
-}
-
-TEST_F(CashImport, RaggedFileKeepsEarlierRows) {
-  WriteCash({{"A", HostDate::Of(2020, 1, 1)}});
+  EXPECT_EQ(ReadCash(company_, db_, panel_, seam_), 0);
+  ExpectOneFault();
+  db_ = WorkDb();
   AppendBytes("icash2.fix", std::string(60, ' '));
-  EXPECT_EQ(RunCash(), 0);
-  EXPECT_EQ(Cash(), Strings{"1|A"});
+  panel_ = Panel{};
+  EXPECT_EQ(ReadCash(company_, db_, panel_, seam_), 0);
+  ExpectOneFault();
+  EXPECT_EQ(Count(db_, "tCash"), 4);
+  std::filesystem::remove(std::filesystem::path(company_) / "icash2.fix");
+  EXPECT_EQ(ReadCash(company_, db_, panel_, seam_), 0);
+  ExpectOneFault();
 }
 
 }  // namespace

@@ -9,7 +9,7 @@
 #include <vector>
 
 #include "import/importcommon.h"
-#include "importtest.h"
+#include "support/importtest.h"
 
 namespace zdr {
 namespace {

@@ -11,8 +11,6 @@
 #include <string_view>
 #include <vector>
 
-#include "control/userseam.h"
-#include "import/codepage.h"
 #include "support/recordingseam.h"
 #include "support/scratchtemp.h"
 #include "workdb/engine.h"
@@ -20,8 +18,6 @@
 #include "zdrgen/generator.h"
 
 namespace zdr::test {
-
-// Records messages, status lines and progress; answers every question with Yes.
 
 // A fixture with its own Temp folder (the working database goes there) and company folder.
 class ImportTest : public ::testing::Test {
