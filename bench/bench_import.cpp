@@ -230,9 +230,10 @@ void BM_ReadItem(benchmark::State& state) {
 
 void BM_ReadTransactions(benchmark::State& state) {
   const Panel panel = WidePanel();
-  RunImporter(
-      state, RecordsIn(CompanyFile("amv.fix"), 180), {"tTransact"},
-      [&](const std::string& db, UserSeam& ui) { ReadTransactions(Company(), db, panel, ui); });
+  RunImporter(state, RecordsIn(CompanyFile("amv.fix"), 180), {"tTransact"},
+              [&](const std::string& db, UserSeam& ui) {
+                ReadTransactions(Company(), db, true, panel, ui);
+              });
 }
 
 void BM_ReadAllTempTrans(benchmark::State& state) {
@@ -240,14 +241,15 @@ void BM_ReadAllTempTrans(benchmark::State& state) {
   int64_t records = 0;
   for (const auto& f : BatchFiles()) records += RecordsIn(f, 220);
   RunImporter(state, records, {"tTransact"}, [&](const std::string& db, UserSeam& ui) {
-    ReadAllTempTrans(Company(), db, panel, ui);
+    ReadAllTempTrans(Company(), db, true, panel, ui);
   });
 }
 
 void BM_ReadCash(benchmark::State& state) {
   const Panel panel = WidePanel();
-  RunImporter(state, RecordsIn(CompanyFile("icash2.fix"), 90), {"tCash"},
-              [&](const std::string& db, UserSeam& ui) { ReadCash(Company(), db, panel, ui); });
+  RunImporter(
+      state, RecordsIn(CompanyFile("icash2.fix"), 90), {"tCash"},
+      [&](const std::string& db, UserSeam& ui) { ReadCash(Company(), db, true, panel, ui); });
 }
 
 void BM_ReadAllData(benchmark::State& state) {
@@ -449,19 +451,19 @@ void BM_FloorItem(benchmark::State& state) {
 }
 void BM_FloorTransactions(benchmark::State& state) {
   static const Captured c = Capture({"tTransact"}, [](const std::string& db, UserSeam& ui) {
-    ReadTransactions(Company(), db, WidePanel(), ui);
+    ReadTransactions(Company(), db, true, WidePanel(), ui);
   });
   RunFloor(state, {CompanyFile("amv.fix")}, 180, c);
 }
 void BM_FloorAllTempTrans(benchmark::State& state) {
   static const Captured c = Capture({"tTransact"}, [](const std::string& db, UserSeam& ui) {
-    ReadAllTempTrans(Company(), db, WidePanel(), ui);
+    ReadAllTempTrans(Company(), db, true, WidePanel(), ui);
   });
   RunFloor(state, BatchFiles(), 220, c);
 }
 void BM_FloorCash(benchmark::State& state) {
   static const Captured c = Capture({"tCash"}, [](const std::string& db, UserSeam& ui) {
-    ReadCash(Company(), db, WidePanel(), ui);
+    ReadCash(Company(), db, true, WidePanel(), ui);
   });
   RunFloor(state, {CompanyFile("icash2.fix")}, 90, c);
 }

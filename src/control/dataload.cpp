@@ -22,7 +22,7 @@ void ReadAllData(bool pAsIs, Panel& panel, ControlState& state, const DocTypeTab
   if (Panel::On(panel.ChkDates) && panel.cmbDocType >= 0) {
     if (panel.cmbDocType == kCashReceiptsRow) {
       ui.SetStatus(kStatusCash);
-      ReadCash(state.companyPath, dbFile, panel, ui, pAsIs);
+      ReadCash(state.companyPath, dbFile, pAsIs, panel, ui);
     } else {
       ui.SetStatus(kStatusDocuments);
       if (panel.cmbDocType > UINT8_MAX) {
@@ -41,10 +41,10 @@ void ReadAllData(bool pAsIs, Panel& panel, ControlState& state, const DocTypeTab
 
   if (UseTransactions(panel)) {
     ui.SetStatus(kStatusLedger);
-    ReadTransactions(state.companyPath, dbFile, panel, ui, pAsIs);
+    ReadTransactions(state.companyPath, dbFile, pAsIs, panel, ui);
     if (Panel::On(panel.chkReadTempTrans)) {
       ui.SetStatus(kStatusBatches);
-      ReadAllTempTrans(state.companyPath, dbFile, panel, ui, pAsIs);
+      ReadAllTempTrans(state.companyPath, dbFile, pAsIs, panel, ui);
     }
   }
 

@@ -685,13 +685,13 @@ int32_t MainCard::ReadStock(int16_t pCompID, const std::string& pCompPath,
 
 int16_t MainCard::ReadTransactions(const std::string& CompPath, const std::string& pDBFile) {
   ReadPanel();
-  return zdr::ReadTransactions(CompPath, pDBFile, control_->panel(), *seam_);
+  return zdr::ReadTransactions(CompPath, pDBFile, true, control_->panel(), *seam_);
 }
 
 int16_t MainCard::ReadTempTransactions(const std::string& CompPath, const std::string& pDBFile,
                                        int16_t pJournalNo) {
   ReadPanel();
-  return zdr::ReadTempTransactions(CompPath, pDBFile, pJournalNo, control_->panel(), *seam_);
+  return zdr::ReadTempTransactions(CompPath, pDBFile, pJournalNo, true, control_->panel(), *seam_);
 }
 
 bool MainCard::UseTransactions() {
@@ -701,12 +701,12 @@ bool MainCard::UseTransactions() {
 
 int16_t MainCard::ReadCash(const std::string& CompPath, const std::string& pDBFile) {
   ReadPanel();
-  return zdr::ReadCash(CompPath, pDBFile, control_->panel(), *seam_);
+  return zdr::ReadCash(CompPath, pDBFile, true, control_->panel(), *seam_);
 }
 
 void MainCard::ReadAllTempTrans(const std::string& CompPath, const std::string& pDBFile) {
   ReadPanel();
-  zdr::ReadAllTempTrans(CompPath, pDBFile, control_->panel(), *seam_);
+  zdr::ReadAllTempTrans(CompPath, pDBFile, true, control_->panel(), *seam_);
 }
 
 void MainCard::ReadItem(const std::string& CompPath, const std::string& pDBFile) {

@@ -55,8 +55,8 @@ std::optional<int16_t> BatchNumberOf(std::string_view name) {
 
 }  // namespace
 
-void ReadAllTempTrans(const std::string& CompPath, const std::string& pDBFile, const Panel& panel,
-                      UserSeam& ui, bool pAsIs) {
+void ReadAllTempTrans(const std::string& CompPath, const std::string& pDBFile, bool pAsIs,
+                      const Panel& panel, UserSeam& ui) {
   const importing::JournalRange journals = importing::JournalRange::FromPanel(panel);
 
   // Listed in the order the folder gives them. A folder that cannot be listed has no batches.
@@ -70,21 +70,21 @@ void ReadAllTempTrans(const std::string& CompPath, const std::string& pDBFile, c
     const std::optional<int16_t> batch = BatchNumberOf(name);
     if (!batch || *batch == 0 || !journals.Contains(*batch)) continue;
     // The file the listing found is read: a012.tmp is batch 12 but is not the file a12.tmp.
-    ReadTempTransactions(CompPath, pDBFile, *batch, name, panel, ui, pAsIs);
+    ReadTempTransactions(CompPath, pDBFile, *batch, name, pAsIs, panel, ui);
   }
 }
 
 int16_t ReadTempTransactions(const std::string& CompPath, const std::string& pDBFile,
-                             int16_t pJournalNo, const Panel& panel, UserSeam& ui, bool pAsIs) {
+                             int16_t pJournalNo, bool pAsIs, const Panel& panel, UserSeam& ui) {
   std::string name = "a";
   name += std::to_string(pJournalNo);
   name += ".tmp";
-  return ReadTempTransactions(CompPath, pDBFile, pJournalNo, name, panel, ui, pAsIs);
+  return ReadTempTransactions(CompPath, pDBFile, pJournalNo, name, pAsIs, panel, ui);
 }
 
 int16_t ReadTempTransactions(const std::string& CompPath, const std::string& pDBFile,
-                             int16_t pJournalNo, const std::string& pFileName, const Panel& panel,
-                             UserSeam& ui, bool pAsIs) {
+                             int16_t pJournalNo, const std::string& pFileName, bool pAsIs,
+                             const Panel& panel, UserSeam& ui) {
   try {
     importing::LedgerFilter filter(panel);
 

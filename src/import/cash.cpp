@@ -29,8 +29,8 @@ std::optional<Date> DateBound(const Panel& panel, const std::string& typed) {
 
 }  // namespace
 
-int16_t ReadCash(const std::string& CompPath, const std::string& pDBFile, const Panel& panel,
-                 UserSeam& ui, bool pAsIs) {
+int16_t ReadCash(const std::string& CompPath, const std::string& pDBFile, bool pAsIs,
+                 const Panel& panel, UserSeam& ui) {
   try {
     const std::optional<Date> from = DateBound(panel, panel.TxtFromDate);
     const std::optional<Date> to = DateBound(panel, panel.TxtToDate);

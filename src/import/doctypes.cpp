@@ -6,13 +6,15 @@ namespace zdr {
 
 DocTypeTable::DocTypeTable() {
   files_ = {"", "ISHP.FIX", "IORDR.FIX", "IMV.FIX", "IBD.FIX", "ICASH2.FIX"};
-  struct Seed {
+  // A filled row as written here: code, names and file; every one but the cash receipts is a
+  // stock document.
+  struct DocTypeEntry {
     int16_t code;
     const char* heb;
     const char* eng;
     int16_t file;
   };
-  static const Seed kSeeds[kDocTypesFilled] = {
+  static const DocTypeEntry kEntries[kDocTypesFilled] = {
       {1, "חשבונית מס", "Invoice", 3},
       {2, "חשבונית מס קבלה", "Invoice/Receipt", 3},
       {3, "חשבונית  סוכן", "Agent Invoice", 3},
@@ -43,7 +45,8 @@ DocTypeTable::DocTypeTable() {
       {102, "*חשבוניות מכירה*", "All Invoices", 3},
   };
   for (int i = 0; i < kDocTypesFilled; ++i) {
-    rows_[i] = DocTypeDef{kSeeds[i].code, kSeeds[i].heb, kSeeds[i].eng, kSeeds[i].file, true};
+    const DocTypeEntry& e = kEntries[i];
+    rows_[i] = DocTypeDef{e.code, e.heb, e.eng, e.file, true};
   }
   rows_[kCashReceiptsRow].IsStockDoc = false;
 }

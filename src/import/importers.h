@@ -12,6 +12,8 @@
 //   importer returns normally; only ReadAllTempTrans lets errors of its own steps escape.
 // - A second row with a key already in the table is passed over silently.
 // - Progress goes to `ui.SetProgress`, 0 at the start and at the end.
+// - Parameters in one order: the host routine's own (company folder, database, then the
+//   rest), the as-is flag, the panel, the document-type table, and last the seam.
 #pragma once
 
 #include <cstdint>
@@ -60,31 +62,30 @@ int32_t ReadStock(int16_t pCompID, const std::string& pCompPath, const std::stri
 // import of the same load converts its keys (`pAsIs`), so that they match tAccount's: with
 // the as-is flag off a key of digits stays in stored order on both sides. The default, on,
 // reverses the key and mirrors its brackets.
-int16_t ReadTransactions(const std::string& CompPath, const std::string& pDBFile,
-                         const Panel& panel, UserSeam& ui, bool pAsIs = true);
+int16_t ReadTransactions(const std::string& CompPath, const std::string& pDBFile, bool pAsIs,
+                         const Panel& panel, UserSeam& ui);
 
 // Lists the company's temporary batches (a<number>.tmp, any case) and reads each whose number
 // is not 0 and lies in the panel's journal range with ReadTempTransactions. Names whose middle
 // is not a number, or a number outside the 16-bit range, are passed over. Throws what it does
 // not handle itself: a journal bound that is not a 16-bit whole number.
-void ReadAllTempTrans(const std::string& CompPath, const std::string& pDBFile, const Panel& panel,
-                      UserSeam& ui, bool pAsIs = true);
+void ReadAllTempTrans(const std::string& CompPath, const std::string& pDBFile, bool pAsIs,
+                      const Panel& panel, UserSeam& ui);
 
 // Transactions of batch `pJournalNo` (the file a<pJournalNo>.tmp) that pass the type pattern
 // and both date ranges into tTransact with FileID pJournalNo. Returns -1 / 0 as
 // ReadTransactions, with the same failure message.
 int16_t ReadTempTransactions(const std::string& CompPath, const std::string& pDBFile,
-                             int16_t pJournalNo, const Panel& panel, UserSeam& ui,
-                             bool pAsIs = true);
+                             int16_t pJournalNo, bool pAsIs, const Panel& panel, UserSeam& ui);
 // The same for the batch file `pFileName` (a name in CompPath, as the listing found it, looked
 // up without regard to case), whose rows carry `pJournalNo`.
 int16_t ReadTempTransactions(const std::string& CompPath, const std::string& pDBFile,
-                             int16_t pJournalNo, const std::string& pFileName, const Panel& panel,
-                             UserSeam& ui, bool pAsIs = true);
+                             int16_t pJournalNo, const std::string& pFileName, bool pAsIs,
+                             const Panel& panel, UserSeam& ui);
 
 // Cash receipts of icash2.fix dated within the panel's document dates (when ChkDates is on;
 // any non-empty date text is a bound) into tCash. Returns -1 / 0 as ReadTransactions.
-int16_t ReadCash(const std::string& CompPath, const std::string& pDBFile, const Panel& panel,
-                 UserSeam& ui, bool pAsIs = true);
+int16_t ReadCash(const std::string& CompPath, const std::string& pDBFile, bool pAsIs,
+                 const Panel& panel, UserSeam& ui);
 
 }  // namespace zdr

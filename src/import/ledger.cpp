@@ -32,8 +32,8 @@ int16_t JournalOf(std::string_view rec) {
 
 }  // namespace
 
-int16_t ReadTransactions(const std::string& CompPath, const std::string& pDBFile,
-                         const Panel& panel, UserSeam& ui, bool pAsIs) {
+int16_t ReadTransactions(const std::string& CompPath, const std::string& pDBFile, bool pAsIs,
+                         const Panel& panel, UserSeam& ui) {
   try {
     const importing::JournalRange journals = importing::JournalRange::FromPanel(panel);
     importing::LedgerFilter filter(panel);

@@ -45,8 +45,8 @@ class LedgerImport : public test::ImportTest {
     for (const auto& t : txs) recs.push_back(zdrgen::BatchRecord(t));
     Write(name, recs);
   }
-  int16_t Run() { return ReadTransactions(company_, db_, panel_, seam_); }
-  void RunBatches() { ReadAllTempTrans(company_, db_, panel_, seam_); }
+  int16_t Run() { return ReadTransactions(company_, db_, true, panel_, seam_); }
+  void RunBatches() { ReadAllTempTrans(company_, db_, true, panel_, seam_); }
   // "FileID|TransID|AccountKey" in that order.
   Strings Transacts() {
     return Rows(db_,
@@ -182,7 +182,7 @@ TEST_F(LedgerImport, WhichBatchesAreRead) {
   }
   EXPECT_EQ(Transacts(), Strings{});
   db_ = WorkDb();
-  EXPECT_EQ(ReadTempTransactions(company_, db_, 12, "a012.tmp", panel_, seam_), -1);
+  EXPECT_EQ(ReadTempTransactions(company_, db_, 12, "a012.tmp", true, panel_, seam_), -1);
   EXPECT_EQ(Transacts(), (Strings{"12|1|1K", "12|1|2K"}));
 }
 
@@ -195,12 +195,12 @@ TEST_F(LedgerImport, BatchAppliesTypeAndDatesButNotTheJournalRangeInside) {
   panel_.txtTransType = "A*";
   panel_.chkTransDates = 1;
   panel_.txtFromTransDate = "1/1/2020";
-  EXPECT_EQ(ReadTempTransactions(company_, db_, 6, panel_, seam_), -1);
+  EXPECT_EQ(ReadTempTransactions(company_, db_, 6, true, panel_, seam_), -1);
   EXPECT_EQ(Transacts(), Strings{"6|1|1K"});
 }
 
 TEST_F(LedgerImport, BatchFaults) {
-  EXPECT_EQ(ReadTempTransactions(company_, db_, 44, panel_, seam_), 0);
+  EXPECT_EQ(ReadTempTransactions(company_, db_, 44, true, panel_, seam_), 0);
   ExpectOneFault();
   WriteBatch("a1.tmp", {Bx("A", {"K1", "", "", ""})});
   AppendBytes("a1.tmp", std::string(200, ' '));
@@ -237,20 +237,20 @@ TEST_F(LedgerImport, CashReceipts) {
     panel_ = Panel{};
     set(panel_);
     db_ = WorkDb();
-    EXPECT_EQ(ReadCash(company_, db_, panel_, seam_), -1);
+    EXPECT_EQ(ReadCash(company_, db_, true, panel_, seam_), -1);
     EXPECT_EQ(Column("SELECT TransID, AccountKey FROM tCash ORDER BY TransID"), rows);
   }
   panel_.TxtToDate = "12-12";
-  EXPECT_EQ(ReadCash(company_, db_, panel_, seam_), 0);
+  EXPECT_EQ(ReadCash(company_, db_, true, panel_, seam_), 0);
   ExpectOneFault();
   db_ = WorkDb();
   AppendBytes("icash2.fix", std::string(60, ' '));
   panel_ = Panel{};
-  EXPECT_EQ(ReadCash(company_, db_, panel_, seam_), 0);
+  EXPECT_EQ(ReadCash(company_, db_, true, panel_, seam_), 0);
   ExpectOneFault();
   EXPECT_EQ(Count(db_, "tCash"), 4);
   std::filesystem::remove(std::filesystem::path(company_) / "icash2.fix");
-  EXPECT_EQ(ReadCash(company_, db_, panel_, seam_), 0);
+  EXPECT_EQ(ReadCash(company_, db_, true, panel_, seam_), 0);
   ExpectOneFault();
 }
 
