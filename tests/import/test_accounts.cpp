@@ -5,6 +5,7 @@
 
 #include <functional>
 #include <string>
+#include <tuple>
 #include <vector>
 
 #include "control/panel.h"
@@ -32,11 +33,11 @@ zdrgen::AccountFields Acc(std::string key, uint8_t agent = 0, std::string sortCo
 class AccountImport : public test::ImportTest {
  protected:
   // Writes ACT.fix with a filler record before and after `accounts` (neither is read).
-  void WriteAccounts(const Accounts& accounts, const std::string& name = "ACT.fix") {
+  void WriteAccounts(const Accounts& accounts) {
     std::vector<std::string> recs{zdrgen::AccountRecord(Acc("FIRST"))};
     for (const auto& a : accounts) recs.push_back(zdrgen::AccountRecord(a));
     recs.push_back(zdrgen::AccountRecord(Acc("LAST")));
-    Write(name, recs);
+    Write("ACT.fix", recs);
   }
   bool Run(bool allDetails = true, bool asIs = false) {
     if (db_.empty()) db_ = WorkDb();
@@ -50,41 +51,28 @@ class AccountImport : public test::ImportTest {
   std::string db_;
 };
 
-// Records 2 to count - 1 are read: a blank key or the deleted mark alone is passed over
-// (regression: a blank key used to end the import, losing the rest), a ragged tail is not
-// read, and the file name is matched without regard to case.
+// Records 2 to count - 1 of the file, found without regard to case, are read; a blank key or
+// the deleted mark alone is passed over (regression: a blank key used to end the import,
+// losing the rest), and a ragged tail is not read.
 TEST_F(AccountImport, WhichRecordsAreRead) {
-  Accounts ten;
-  for (int i = 1; i <= 10; ++i) ten.push_back(Acc(std::to_string(i)));
-  struct Case {
-    const char* what;
-    std::vector<std::string> records;
-    Strings keys;
+  const std::string marks(8, '\x01');
+  const std::pair<Accounts, Strings> cases[] = {
+      {{Acc("F"), Acc("2"), Acc("3"), Acc("L")}, {"2", "3"}},
+      {{}, {}},
+      {{Acc("1")}, {}},
+      {{Acc("F"), Acc("1"), Acc(""), Acc("2"), Acc("L")}, {"1", "2"}},
+      {{Acc("F"), Acc("1"), Acc("\x01"), Acc(marks), Acc("L")}, {marks, "1"}},
   };
-  auto framed = [](const Accounts& middle) {
-    std::vector<std::string> recs{zdrgen::AccountRecord(Acc("FIRST"))};
-    for (const auto& a : middle) recs.push_back(zdrgen::AccountRecord(a));
-    recs.push_back(zdrgen::AccountRecord(Acc("LAST")));
-    return recs;
-  };
-  const Case cases[] = {
-      {"ten", framed({Acc("2"), Acc("3"), Acc("4"), Acc("5")}), {"2", "3", "4", "5"}},
-      {"empty", {}, {}},
-      {"one", {zdrgen::AccountRecord(Acc("1"))}, {}},
-      {"blank key", framed({Acc("1"), Acc(""), Acc("2")}), {"1", "2"}},
-      {"deleted",
-       framed({Acc("1"), Acc("\x01"), Acc(std::string(8, '\x01'))}),
-       {std::string(8, '\x01'), "1"}},
-  };
-  for (const Case& c : cases) {
-    SCOPED_TRACE(c.what);
-    Write("act.FIX", c.records);
+  for (const auto& [accounts, keys] : cases) {
+    std::vector<std::string> recs;
+    for (const auto& a : accounts) recs.push_back(zdrgen::AccountRecord(a));
+    Write("act.FIX", recs);
     AppendBytes("act.FIX", std::string(100, 'Z'));
     db_.clear();
     EXPECT_TRUE(Run());
-    EXPECT_EQ(Keys(), c.keys);
-    EXPECT_TRUE(seam_.messages.empty());
+    EXPECT_EQ(Keys(), keys);
   }
+  EXPECT_TRUE(seam_.messages.empty());
 }
 
 // Each row sets some of the account criteria on a fresh panel and names the keys that pass;
@@ -100,90 +88,42 @@ TEST_F(AccountImport, CriteriaBoundsAreInclusive) {
                           Acc("30", 1, "  5", "A   "),       Acc("40", 5, "  9", "A   "),
                           Acc("50", 5, "  5", "A   "),       Acc("60", 5, "  5", "ABCD"),
                           Acc("70", 5, "  5", alef + "   "), Acc("80", 5, "  5", "A BC")};
-  struct Case {
-    const char* what;
-    const Accounts& accounts;
-    std::function<void(Panel&)> set;
-    Strings keys;
-    bool fault = false;
-  };
-  const Case cases[] = {
-      {"agent from", agents, [](Panel& p) { p.ChkAgent = 1, p.txtAgent = "3"; }, {"3", "4"}},
-      {"agent both",
-       agents,
-       [](Panel& p) { p.ChkAgent = 1, p.txtAgent = "2", p.txtToAgent = "3"; },
-       {"2", "3"}},
-      {"agent greyed is off",
-       agents,
-       [](Panel& p) { p.ChkAgent = 2, p.txtAgent = "2", p.txtToAgent = "3"; },
-       {"1", "2", "3", "4"}},
-      {"agent of letters",
-       agents,
-       [](Panel& p) { p.ChkAgent = 1, p.txtToAgent = "abc"; },
-       {},
-       true},
-      {"agent above a byte",
-       agents,
-       [](Panel& p) { p.ChkAgent = 1, p.txtAgent = "256"; },
-       {},
-       true},
-      {"numeric keys",
-       numbers,
-       [](Panel& p) { p.ChkAccKey = 1, p.TxtFromCrd = "100", p.TxtToCrd = "200"; },
-       {"100", "150", "200"}},
+  // A fault ends the import before any row.
+  const Strings fault = {"fault"};
+  const std::tuple<const Accounts&, std::function<void(Panel&)>, Strings> cases[] = {
+      // clang-format off
+      {agents, [](Panel& p) { p.ChkAgent = 1, p.txtAgent = "3"; }, {"3", "4"}},
+      {agents, [](Panel& p) { p.ChkAgent = 1, p.txtAgent = "2", p.txtToAgent = "3"; }, {"2", "3"}},
+      {agents, [](Panel& p) { p.ChkAgent = 2, p.txtAgent = "2", p.txtToAgent = "3"; }, {"1", "2", "3", "4"}},
+      {agents, [](Panel& p) { p.ChkAgent = 1, p.txtToAgent = "abc"; }, fault},
+      {agents, [](Panel& p) { p.ChkAgent = 1, p.txtAgent = "256"; }, fault},
+      {numbers, [](Panel& p) { p.ChkAccKey = 1, p.TxtFromCrd = "100", p.TxtToCrd = "200"; }, {"100", "150", "200"}},
       // One bound empty: compared as text, where 1500 and 50 are not below 100.
-      {"text keys",
-       numbers,
-       [](Panel& p) { p.ChkAccKey = 1, p.TxtFromCrd = "100"; },
-       {"50", "100", "150", "200", "201", "1500"}},
-      {"letters and Hebrew",
-       texts,
-       [](Panel& p) { p.ChkAccKey = 1, p.TxtFromCrd = "B", p.TxtToCrd = "ת"; },
-       {"אב", "B2", "C3"}},
+      {numbers, [](Panel& p) { p.ChkAccKey = 1, p.TxtFromCrd = "100"; }, {"50", "100", "150", "200", "201", "1500"}},
+      {texts, [](Panel& p) { p.ChkAccKey = 1, p.TxtFromCrd = "B", p.TxtToCrd = "ת"; }, {"אב", "B2", "C3"}},
       // A short sort bound is padded to "  5", which keeps "  3" out and lets " 10" in.
-      {"sort from",
-       sorts,
-       [](Panel& p) { p.ChkCatCode = 1, p.txtFromSort = "5"; },
-       {"2", "3", "4"}},
-      {"sort both",
-       sorts,
-       [](Panel& p) { p.ChkCatCode = 1, p.txtFromSort = "5", p.txtToSort = "5"; },
-       {"2"}},
-      {"cut-off all stars",
-       mixed,
-       [](Panel& p) { p.chkCutOff = 1; },
-       {"10", "20", "30", "40", "50", "60", "70", "80"}},
-      // The stored field is reversed: the first classification is its last byte.
-      {"cut-off Hebrew letter",
-       mixed,
-       [](Panel& p) { p.chkCutOff = 1, p.CutOff[1] = "א"; },
-       {"70"}},
-      {"cut-off empty box is a space",
-       mixed,
-       [](Panel& p) { p.chkCutOff = 1, p.CutOff[2] = ""; },
-       {"10", "20", "30", "40", "50", "70", "80"}},
-      {"all together",
-       mixed,
-       [](Panel& p) {
-         p.ChkAgent = 1, p.txtAgent = "2", p.ChkAccKey = 1, p.TxtFromCrd = "10";
-         p.TxtToCrd = "50", p.ChkCatCode = 1, p.txtFromSort = "5", p.txtToSort = "5";
-         p.chkCutOff = 1, p.CutOff[1] = "A";
-       },
-       {"10", "50"}},
+      {sorts, [](Panel& p) { p.ChkCatCode = 1, p.txtFromSort = "5"; }, {"2", "3", "4"}},
+      {sorts, [](Panel& p) { p.ChkCatCode = 1, p.txtFromSort = "5", p.txtToSort = "5"; }, {"2"}},
+      {mixed, [](Panel& p) { p.chkCutOff = 1; }, {"10", "20", "30", "40", "50", "60", "70", "80"}},
+      // The first classification is the field's first byte; an empty box matches a space.
+      {mixed, [](Panel& p) { p.chkCutOff = 1, p.CutOff[1] = "א"; }, {"70"}},
+      {mixed, [](Panel& p) { p.chkCutOff = 1, p.CutOff[2] = ""; }, {"10", "20", "30", "40", "50", "70", "80"}},
+      {mixed, [](Panel& p) { p.ChkAgent = 1, p.txtAgent = "2", p.ChkAccKey = 1, p.TxtFromCrd = "10";
+                             p.TxtToCrd = "50", p.ChkCatCode = 1, p.txtFromSort = "5", p.txtToSort = "5";
+                             p.chkCutOff = 1, p.CutOff[1] = "A"; }, {"10", "50"}},
+      // clang-format on
   };
-  for (const Case& c : cases) {
-    SCOPED_TRACE(c.what);
-    WriteAccounts(c.accounts);
+  int row = 0;
+  for (const auto& [accounts, set, keys] : cases) {
+    WriteAccounts(accounts);
     panel_ = Panel{};
-    c.set(panel_);
+    set(panel_);
     db_.clear();
     seam_.messages.clear();
-    EXPECT_EQ(Run(), !c.fault);
-    EXPECT_EQ(Keys(), c.keys);
-    ASSERT_EQ(seam_.messages.size(), c.fault ? 1u : 0u);
-    if (c.fault) {
-      EXPECT_EQ(seam_.messages[0].title, "תקלה בקריאת החשבונות");
-    }
+    const bool faulted = !Run();
+    EXPECT_EQ(faulted ? fault : Keys(), keys) << "row " << row++;
+    ASSERT_EQ(seam_.messages.size(), faulted ? 1u : 0u);
+    for (const auto& m : seam_.messages) EXPECT_EQ(m.title, "תקלה בקריאת החשבונות");
   }
   // With the criterion on, an empty box is written back as a space; with it off, left alone.
   panel_ = Panel{};
@@ -230,12 +170,7 @@ TEST_F(AccountImport, DuplicateKeyOrSortKeyKeepsTheFirst) {
   a.city = test::HostText("עכו", 15);
   b.city = test::HostText("לוד", 15);
   // "-א1" and ".א1" show as different keys but share the sort key "1 א ".
-  WriteAccounts({a, b,
-                 Acc("-\x80"
-                     "1"),
-                 Acc(".\x80"
-                     "1"),
-                 Acc("6")});
+  WriteAccounts({a, b, Acc(std::string("-\x80") + "1"), Acc(std::string(".\x80") + "1"), Acc("6")});
   EXPECT_TRUE(Run());
   EXPECT_TRUE(seam_.messages.empty());
   EXPECT_EQ(Rows(db_, "SELECT AccountKey, City FROM tAccount ORDER BY SortByKey"),
@@ -253,10 +188,17 @@ TEST_F(AccountImport, ShortRowsIntoSelectionDatabase) {
             (Strings{"1|1 |לקוח|-1", "2|2 |לקוח|-1"}));
 }
 
-TEST_F(AccountImport, MissingFileOrDatabaseIsFault) {
-  EXPECT_FALSE(Run());
-  WriteAccounts({Acc("1")});
+// Progress every fifth record over the count less one; a missing file or database is a fault.
+TEST_F(AccountImport, ProgressAndFaults) {
+  Accounts ten;
+  for (int i = 2; i <= 11; ++i) ten.push_back(Acc(std::to_string(i)));
+  WriteAccounts(ten);
+  EXPECT_TRUE(Run());
+  // q = 11: 3000 x 5 / 11 and 3000 x 10 / 11, rounded.
+  EXPECT_EQ(seam_.progress, (std::vector<int>{0, 1364, 2727, 0}));
   db_ = (root_ / "nowhere" / "zdrlab.DB").string();
+  EXPECT_FALSE(Run());
+  std::filesystem::remove(std::filesystem::path(company_) / "ACT.fix");
   EXPECT_FALSE(Run());
   ASSERT_EQ(seam_.messages.size(), 2u);
   for (const auto& m : seam_.messages) {
@@ -264,17 +206,6 @@ TEST_F(AccountImport, MissingFileOrDatabaseIsFault) {
     EXPECT_EQ(m.icon, MsgIcon::Critical);
     EXPECT_FALSE(m.text.empty());
   }
-}
-
-TEST_F(AccountImport, ProgressEveryFifthRecordOverCountLessOne) {
-  Accounts ten;
-  for (int i = 2; i <= 11; ++i) ten.push_back(Acc(std::to_string(i)));
-  WriteAccounts(ten);
-  db_ = WorkDb();
-  seam_.progress.clear();
-  EXPECT_TRUE(Run());
-  // q = 11: 3000 x 5 / 11 and 3000 x 10 / 11, rounded.
-  EXPECT_EQ(seam_.progress, (std::vector<int>{0, 1364, 2727, 0}));
 }
 
 }  // namespace

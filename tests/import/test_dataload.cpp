@@ -9,6 +9,7 @@
 #include <iterator>
 #include <set>
 #include <string>
+#include <tuple>
 #include <vector>
 
 #include "control/control.h"
@@ -58,66 +59,42 @@ class DataLoad : public test::ImportTest {
 
   void Load(bool asIs = true) { ReadAllData(asIs, panel_, state_, docTypes_, seam_); }
   Strings Query(const std::string& sql) { return Rows(state_.workDbPath, sql); }
-  // The row counts of tAccount, tStockHead, tStockLine, tItem, tCash and tTransact.
-  std::string Counts() {
-    std::string out;
-    for (const char* t : {"tAccount", "tStockHead", "tStockLine", "tItem", "tCash", "tTransact"}) {
-      out += std::to_string(Count(state_.workDbPath, t));
-    }
-    return out;
-  }
-
   Panel panel_;
   ControlState state_;
   DocTypeTable docTypes_;
 };
 
+// Each case: the criteria set, the status lines shown, and the row counts of tAccount,
+// tStockHead, tStockLine, tItem, tCash and tTransact.
 TEST_F(DataLoad, WhichImportersRunInWhichOrder) {
-  struct Case {
-    const char* what;
-    std::function<void(Panel&)> set;
-    Strings statuses;
-    const char* counts;
+  const std::tuple<std::function<void(Panel&)>, Strings, const char*> cases[] = {
+      // clang-format off
+      // Batches and items need another criterion.
+      {[](Panel& p) { p.chkReadTempTrans = 1, p.ChkByItems = 1; }, {kInit, kAccounts, kDone}, "200000"},
+      // Cash receipts instead of documents, even with items.
+      {[](Panel& p) { p.ChkDates = 1, p.cmbDocType = kCashReceiptsRow, p.ChkByItems = 1; },
+       {kInit, kAccounts, kCash, kDone}, "200010"},
+      {[](Panel& p) { p.ChkDates = 1, p.cmbDocType = 0, p.ChkByItems = 1; },
+       {kInit, kAccounts, kDocs, kItems, kDone}, "211100"},
+      {[](Panel& p) { p.ChkDates = 1; }, {kInit, kAccounts, kDocs, kDone}, "210000"},
+      {[](Panel& p) { p.ChkDates = 1, p.cmbDocType = -1; }, {kInit, kAccounts, kDone}, "200000"},
+      {[](Panel& p) { p.ChkJournal = 1, p.txtFromJournal = "1", p.chkReadTempTrans = 1; },
+       {kInit, kAccounts, kLedger, kBatches, kDone}, "200002"},
+      {[](Panel& p) { p.chkTransType = 1, p.txtTransType = "*"; }, {kInit, kAccounts, kLedger, kDone}, "200001"},
+      // clang-format on
   };
-  const Case cases[] = {
-      {"every criterion off; batches and items need another criterion",
-       [](Panel& p) { p.chkReadTempTrans = 1, p.ChkByItems = 1; },
-       {kInit, kAccounts, kDone},
-       "200000"},
-      {"cash receipts instead of documents, even with items",
-       [](Panel& p) { p.ChkDates = 1, p.cmbDocType = kCashReceiptsRow, p.ChkByItems = 1; },
-       {kInit, kAccounts, kCash, kDone},
-       "200010"},
-      {"documents with lines, then items",
-       [](Panel& p) { p.ChkDates = 1, p.cmbDocType = 0, p.ChkByItems = 1; },
-       {kInit, kAccounts, kDocs, kItems, kDone},
-       "211100"},
-      {"documents without items keep no lines",
-       [](Panel& p) { p.ChkDates = 1; },
-       {kInit, kAccounts, kDocs, kDone},
-       "210000"},
-      {"no document type chosen",
-       [](Panel& p) { p.ChkDates = 1, p.cmbDocType = -1; },
-       {kInit, kAccounts, kDone},
-       "200000"},
-      {"ledger, then batches",
-       [](Panel& p) { p.ChkJournal = 1, p.txtFromJournal = "1", p.chkReadTempTrans = 1; },
-       {kInit, kAccounts, kLedger, kBatches, kDone},
-       "200002"},
-      {"ledger without batches",
-       [](Panel& p) { p.chkTransType = 1, p.txtTransType = "*"; },
-       {kInit, kAccounts, kLedger, kDone},
-       "200001"},
-  };
-  for (const Case& c : cases) {
-    SCOPED_TRACE(c.what);
+  for (const auto& [set, statuses, counts] : cases) {
     panel_ = Panel{};
-    c.set(panel_);
+    set(panel_);
     seam_.statuses.clear();
     Load();
-    EXPECT_EQ(seam_.statuses, c.statuses);
+    EXPECT_EQ(seam_.statuses, statuses);
     EXPECT_TRUE(seam_.messages.empty());
-    EXPECT_EQ(Counts(), c.counts);
+    std::string rows;
+    for (const char* t : {"tAccount", "tStockHead", "tStockLine", "tItem", "tCash", "tTransact"}) {
+      rows += std::to_string(Count(state_.workDbPath, t));
+    }
+    EXPECT_EQ(rows, counts);
   }
 }
 

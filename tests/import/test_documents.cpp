@@ -70,21 +70,18 @@ class DocumentImport : public test::ImportTest {
 // Regression inside: a header field of quotes only converts to nothing, and the empty text
 // the table refused used to end the whole document import.
 TEST_F(DocumentImport, HeaderAndLineValues) {
-  zdrgen::DocHeaderFields h;
-  h.type = 1;
-  h.accountKey = "AB(1";
-  h.name = test::HostText("משה כהן", 30);
-  h.address1 = test::HostText("הרצל 5", 30);
-  h.address2 = test::HostText("חיפה", 30);
-  h.reference = "00042";
-  h.details = test::HostText("לכבוד", 48);
-  h.lineCount = 1;
-  zdrgen::DocHeaderFields blank;
-  blank.lineCount = 1;
-  zdrgen::DocHeaderFields quotes = blank;
-  quotes.name = "\"\"";
-  quotes.address2 = "()";
-  quotes.details = "\"()\"";
+  using test::HostText;
+  const zdrgen::DocHeaderFields h{1,
+                                  1,
+                                  "AB(1",
+                                  HostText("משה כהן", 30),
+                                  HostText("הרצל 5", 30),
+                                  HostText("חיפה", 30),
+                                  "00042",
+                                  HostText("לכבוד", 48),
+                                  1};
+  const zdrgen::DocHeaderFields blank{1, 1, "", "", "", "", "", "", 1};
+  const zdrgen::DocHeaderFields quotes{1, 1, "", "\"\"", "", "()", "", "\"()\"", 1};
   Records recs;
   for (const auto& header : {h, blank, quotes}) {
     recs.push_back(zdrgen::DocHeaderRecord(header));
@@ -137,47 +134,26 @@ TEST_F(DocumentImport, WhichDocumentsAreRead) {
   claims[0] = zdrgen::DocHeaderRecord(h);
   claims = Join({claims, Doc(1, {{"I1", 1}}, "2")});
   struct Case {
-    const char* what;
     const Records& records;
     int row;
     const char *from, *to, *fromRef, *toRef;
     Strings refs;
   };
   const Case cases[] = {
-      {"all sales invoices",
-       sales,
-       kAllSalesInvoicesRow,
-       "",
-       "",
-       "",
-       "",
-       {"0", "1", "2", "3", "4"}},
-      {"deliveries from their own file", sales, kDeliveryRow, "", "", "", "", {"20"}},
-      {"accepted lines", lines, kInvoiceRow, "", "", "", "", {"3"}},
-      {"dates", dates, kInvoiceRow, "1/2/20", "29/2/2020", "", "", {"2", "3"}},
-      {"five characters is no bound",
-       dates,
-       kInvoiceRow,
-       "1/2/2",
-       "29/2/2020",
-       "",
-       "",
-       {"1", "2", "3"}},
-      {"excluded document's lines", claims, kInvoiceRow, "01/01/2000", "", "", "", {"2"}},
-      {"number at the start, halves to even",
-       refs,
-       kInvoiceRow,
-       "",
-       "",
-       " 10abc",
-       "12.5",
-       {"10", "12"}},
-      {"not a number is 0", refs, kInvoiceRow, "", "", "", "abc", {"0"}},
+      // clang-format off
+      {sales, kAllSalesInvoicesRow, "", "", "", "", {"0", "1", "2", "3", "4"}},
+      {sales, kDeliveryRow, "", "", "", "", {"20"}},  // from its own file
+      {lines, kInvoiceRow, "", "", "", "", {"3"}},
+      {dates, kInvoiceRow, "1/2/20", "29/2/2020", "", "", {"2", "3"}},
+      {dates, kInvoiceRow, "1/2/2", "29/2/2020", "", "", {"1", "2", "3"}},  // 5 characters: no bound
+      {claims, kInvoiceRow, "01/01/2000", "", "", "", {"2"}},
+      {refs, kInvoiceRow, "", "", " 10abc", "12.5", {"10", "12"}},  // the number at the start, halves to even
+      {refs, kInvoiceRow, "", "", "", "abc", {"0"}},  // not a number: 0
+      // clang-format on
   };
+  Write("ISHP.FIX", Join({Doc(20, {{"A", 20}}, "20"), Doc(21, {{"B", 21}}, "21")}));
   for (const Case& c : cases) {
-    SCOPED_TRACE(c.what);
     Write("IMV.FIX", c.records);
-    Write("ISHP.FIX", Join({Doc(20, {{"A", 20}}, "20"), Doc(21, {{"B", 21}}, "21")}));
     from_ = c.from;
     to_ = c.to;
     panel_.txtFromRef = c.fromRef;
@@ -185,7 +161,7 @@ TEST_F(DocumentImport, WhichDocumentsAreRead) {
     db_.clear();
     Run(c.row);
     EXPECT_TRUE(seam_.messages.empty());
-    EXPECT_EQ(Column("Reference1"), c.refs);
+    EXPECT_EQ(Column("Reference1"), c.refs) << "row " << &c - cases;
   }
   Write("IMV.FIX", lines);
   panel_ = Panel{};

@@ -5,7 +5,6 @@
 #include <cctype>
 #include <random>
 #include <string>
-#include <thread>
 
 #include "import/codepage.h"
 
@@ -56,18 +55,13 @@ struct ConversionCase {
   std::string field, result;
 };
 
-std::string Display(std::string_view s) {
-  return ConvertForDisplay(s, false);
-}
-std::string DisplayAsIs(std::string_view s) {
-  return ConvertForDisplay(s, true);
-}
-
 TEST(FieldConversions, GiveTheirBytes) {
   const auto reverse = [](std::string_view s) { return ReverseAndMirror(s); };
   const auto hebrewFirst = [](std::string_view s) { return ReorderHebrewFirst(s); };
   const auto sort = [](std::string_view s) { return ConvertForSort(s); };
   const auto spaced = [](std::string_view s) { return ConvertSpaced(s); };
+  const auto Display = [](std::string_view s) { return ConvertForDisplay(s, false); };
+  const auto DisplayAsIs = [](std::string_view s) { return ConvertForDisplay(s, true); };
   const ConversionCase cases[] = {
       {"reverse", reverse, "\x82\x81\x80", "\xE0\xE1\xE2"},
       {"reverse", reverse, "(12)", "(21)"},
@@ -133,16 +127,10 @@ TEST(ParseHostDate, ReadsCarriesAndRounds) {
     }
   }
   EXPECT_THROW(ParseHostDate("5/3/\x80\x81"), HostTextError);
-}
-
-TEST(HostDates, CountFrom1900AndCarry) {
-  EXPECT_EQ(HostDateFromBytes(105, 3, 5).serial, Date::FromParts(2005, 3, 5).serial);
-  EXPECT_EQ(HostDateFromBytes(99, 2, 30).serial, Date::FromParts(1999, 3, 2).serial);
-  EXPECT_EQ(Date::FromParts(1899, 12, 30).serial, 0);
-  EXPECT_EQ(Date::FromParts(2000, 1, 1).serial, 36526);
-  EXPECT_EQ(Date::FromParts(2005, -12, 1).serial, Date::FromParts(2003, 12, 1).serial);
-  EXPECT_EQ(Date::FromParts(2004, 3, 0).serial, Date::FromParts(2004, 2, 29).serial);
-  EXPECT_EQ(FormatDate(Date::FromParts(1900, 2, 29)), "01/03/1900");
+  // Serial day numbers count from 30 December 1899; 1900 was no leap year.
+  EXPECT_EQ(ParseHostDate("30/12/1899").serial, 0);
+  EXPECT_EQ(ParseHostDate("1/1/2000").serial, 36526);
+  EXPECT_EQ(ParseHostDate("29/2/1900").serial, ParseHostDate("1/3/1900").serial);
 }
 
 TEST(HostIntValue, ReadsRoundsHalvesToEvenOrThrows) {
@@ -241,20 +229,6 @@ TEST(BidiReorder, RightToLeftRuleAgreesWithIcu) {
     if (s.find_first_of(hebrew) == std::string::npos) s.insert(below(s.size() + 1), 1, hebrew[0]);
     ASSERT_EQ(BidiReorder(s), ReorderedByIcu(s)) << "input: " << U8(s);
   }
-}
-
-TEST(BidiReorder, EachThreadHasItsOwnState) {
-  std::string a, b;
-  std::thread t1([&] {
-    for (int i = 0; i < 500; ++i) a = BidiReorder(W("ןהכ השמ"));
-  });
-  std::thread t2([&] {
-    for (int i = 0; i < 500; ++i) b = BidiReorder(W("0501234567 ןופלט"));
-  });
-  t1.join();
-  t2.join();
-  EXPECT_EQ(U8(a), "משה כהן");
-  EXPECT_EQ(U8(b), "טלפון 0501234567");
 }
 
 // Regressions: a line without a Hebrew letter was read right to left ("Studio 54" came back

@@ -25,8 +25,9 @@ zdrgen::LedgerFields Tx(int16_t journal, std::string type, Keys keys,
                         HostDate valueDate = HostDate::Of(2020, 6, 15)) {
   return {journal, std::move(type), std::move(keys), date, valueDate};
 }
-zdrgen::BatchFields Bx(std::string type, Keys keys, HostDate date = HostDate::Of(2020, 6, 15)) {
-  return {std::move(type), std::move(keys), date, date};
+zdrgen::BatchFields Bx(std::string type, Keys keys, HostDate date = HostDate::Of(2020, 6, 15),
+                       HostDate valueDate = HostDate::Of(2020, 6, 15)) {
+  return {std::move(type), std::move(keys), date, valueDate};
 }
 
 class LedgerImport : public test::ImportTest {
@@ -88,29 +89,22 @@ TEST_F(LedgerImport, JournalTypeAndDateCriteria) {
     return [pattern](Panel& p) { p.chkTransType = 1, p.txtTransType = pattern; };
   };
   const std::pair<std::function<void(Panel&)>, Strings> cases[] = {
-      {[](Panel& p) { p.ChkJournal = 1, p.txtFromJournal = "5", p.txtToJournal = "7"; },
-       {"2", "3", "6"}},
+      // clang-format off
+      {[](Panel& p) { p.ChkJournal = 1, p.txtFromJournal = "5", p.txtToJournal = "7"; }, {"2", "3", "6"}},
       {[](Panel& p) { p.ChkJournal = 1, p.txtFromJournal = "5"; }, {"2", "3", "4", "6"}},
       {[](Panel& p) { p.txtFromJournal = "5"; }, {"1", "2", "3", "4", "5", "6"}},
-      {type("*"), {"1", "2", "3", "4", "5", "6"}},
-      {type("?"), {"2", "3", "4"}},
-      {type("#"), {"4"}},
-      {type("[A-C]"), {"2", "3"}},
-      {type("[!A]"), {"3", "4"}},
-      {type("A*"), {"1", "2"}},
-      {type("אב"), {"6"}},
-      {type("א?"), {"6"}},
+      {type("*"), {"1", "2", "3", "4", "5", "6"}}, {type("?"), {"2", "3", "4"}}, {type("#"), {"4"}},
+      {type("[A-C]"), {"2", "3"}}, {type("[!A]"), {"3", "4"}}, {type("A*"), {"1", "2"}},
+      {type("אב"), {"6"}}, {type("א?"), {"6"}},
       // Regression: the spaced conversion ends a Latin or digit type with a space, so a
       // pattern typed as the type reads never matched it. The converted form still matches.
-      {type("AB"), {"1"}},
-      {type("# "), {"4"}},
-      {[](Panel& p) {
-         p.chkTransDates = 1, p.txtFromTransDate = "1/1/20", p.txtToTransDate = "31/01/2020";
-         p.chkTransVDate = 1, p.txtFromTransVDate = "01/05/2020", p.txtToTransVDate = "31/5/20";
-       },
+      {type("AB"), {"1"}}, {type("# "), {"4"}},
+      {[](Panel& p) { p.chkTransDates = 1, p.txtFromTransDate = "1/1/20", p.txtToTransDate = "31/01/2020";
+                      p.chkTransVDate = 1, p.txtFromTransVDate = "01/05/2020", p.txtToTransVDate = "31/5/20"; },
        {"1", "2"}},
       {[](Panel& p) { p.chkTransDates = 1, p.txtFromTransDate = "", p.txtToTransDate = ""; },
        {"1", "2", "3", "4", "5", "6"}},
+      // clang-format on
   };
   for (const auto& [set, ids] : cases) {
     panel_ = Panel{};
@@ -187,14 +181,18 @@ TEST_F(LedgerImport, WhichBatchesAreRead) {
 }
 
 TEST_F(LedgerImport, BatchAppliesTypeAndDatesButNotTheJournalRangeInside) {
-  WriteBatch("a6.tmp", {Bx("AB", {"K1", "", "", ""}), Bx("CD", {"K2", "", "", ""}),
-                        Bx("AB", {"K3", "", "", ""}, HostDate::Of(2019, 1, 1))});
+  WriteBatch("a6.tmp",
+             {Bx("AB", {"K1", "", "", ""}), Bx("CD", {"K2", "", "", ""}),
+              Bx("AB", {"K3", "", "", ""}, HostDate::Of(2019, 1, 1)),
+              Bx("AB", {"K4", "", "", ""}, HostDate::Of(2020, 6, 15), HostDate::Of(2019, 12, 31))});
   panel_.ChkJournal = 1;
   panel_.txtFromJournal = "7";
   panel_.chkTransType = 1;
   panel_.txtTransType = "A*";
   panel_.chkTransDates = 1;
   panel_.txtFromTransDate = "1/1/2020";
+  panel_.chkTransVDate = 1;
+  panel_.txtFromTransVDate = "1/1/2020";
   EXPECT_EQ(ReadTempTransactions(company_, db_, 6, true, panel_, seam_), -1);
   EXPECT_EQ(Transacts(), Strings{"6|1|1K"});
 }

@@ -1,7 +1,6 @@
 // The import pipeline over many batches: rows in the order recorded, the seam only on the
 // calling thread, and a failure on either side raised where one thread would have raised it.
 #include <gtest/gtest.h>
-#include <sqlite3.h>
 
 #include <stdexcept>
 #include <string>
@@ -80,16 +79,7 @@ class Pipeline : public test::ImportTest {
 
   // The item keys in the order they were written.
   std::vector<std::string> KeysInTableOrder() {
-    db::Database database = db::Database::Open(db_);
-    sqlite3_stmt* st = nullptr;
-    sqlite3_prepare_v2(database.Handle(), "SELECT ItemKey FROM tItem ORDER BY rowid", -1, &st,
-                       nullptr);
-    std::vector<std::string> keys;
-    while (sqlite3_step(st) == SQLITE_ROW) {
-      keys.emplace_back(reinterpret_cast<const char*>(sqlite3_column_text(st, 0)));
-    }
-    sqlite3_finalize(st);
-    return keys;
+    return Rows(db_, "SELECT ItemKey FROM tItem ORDER BY rowid");
   }
 
   std::string db_;

@@ -5,6 +5,7 @@
 #include <gtest/gtest.h>
 #include <stdlib.h>
 
+#include <cmath>
 #include <filesystem>
 #include <fstream>
 #include <string>
@@ -51,31 +52,24 @@ class ImportTest : public ::testing::Test {
     db::Database db = db::Database::Open(dbPath);
     db::Snapshot snap = db.OpenSnapshot(sql);
     std::vector<std::string> rows;
-    while (!snap.AtEnd()) {
+    for (; !snap.AtEnd(); snap.MoveNext()) {
       std::string row;
       for (int i = 0; i < snap.FieldCount(); ++i) {
-        if (i > 0) row += '|';
-        row += ValueText(snap.Field(i));
+        const db::Value& v = snap.Field(i);
+        const auto* d = std::get_if<double>(&v);
+        row += (i > 0 ? "|" : "") +
+               (db::IsNull(v)               ? "<null>"
+                : std::get_if<int64_t>(&v)  ? std::to_string(std::get<int64_t>(v))
+                : d && *d == std::trunc(*d) ? std::to_string(static_cast<int64_t>(*d))
+                : d                         ? std::to_string(*d)
+                                            : std::get<std::string>(v));
       }
       rows.push_back(row);
-      snap.MoveNext();
     }
     return rows;
   }
-  static std::string ValueText(const db::Value& v) {
-    if (db::IsNull(v)) return "<null>";
-    if (const auto* i = std::get_if<int64_t>(&v)) return std::to_string(*i);
-    if (const auto* d = std::get_if<double>(&v)) {
-      if (*d == static_cast<double>(static_cast<int64_t>(*d))) {
-        return std::to_string(static_cast<int64_t>(*d));
-      }
-      return std::to_string(*d);
-    }
-    return std::get<std::string>(v);
-  }
   static int64_t Count(const std::string& dbPath, const std::string& table) {
-    auto rows = Rows(dbPath, "SELECT Count(*) AS N FROM " + table);
-    return rows.empty() ? -1 : std::stoll(rows[0]);
+    return std::stoll(Rows(dbPath, "SELECT Count(*) AS N FROM " + table).at(0));
   }
 
   ScratchTemp scratch_;

@@ -108,11 +108,10 @@ zdr::test::ScratchTemp* CompanyTest::dir_ = nullptr;
 CompanyTruth* CompanyTest::truth_ = nullptr;
 
 TEST_F(CompanyTest, FilesOfWholeRecordsBetweenTheMarkers) {
-  const std::pair<const char*, size_t> sizes[] = {{"ACT.fix", 650 * 202},
-                                                  {"amv.fix", 180 * 500},
-                                                  {"icash2.fix", 90 * 100},
-                                                  {"ADF.FIX", 7359},
-                                                  {"a012.tmp", 220 * 50}};
+  const std::pair<const char*, size_t> sizes[] = {// clang-format off
+      {"ACT.fix", 650 * 202}, {"amv.fix", 180 * 500}, {"icash2.fix", 90 * 100}, {"ADF.FIX", 7359},
+      {"a012.tmp", 220 * 50}};
+  // clang-format on
   for (const auto& [name, size] : sizes) EXPECT_EQ(fs::file_size(folder() / name), size) << name;
   for (const char* name : {"ISHP.FIX", "IORDR.FIX", "IMV.FIX", "IBD.FIX"}) {
     EXPECT_GT(fs::file_size(folder() / name), 0u) << name;
@@ -175,9 +174,7 @@ TEST_F(CompanyTest, ContentCoversTheHardCases) {
   int deleted = 0, duplicate = 0, mixedText = 0, blankItems = 0, hashLines = 0, starLines = 0,
       otherType = 0, blankEntries = 0, twice = 0;
   for (const AccountTruth& a : truth_->accounts) {
-    deleted += a.deleted;
-    duplicate += a.duplicateKey;
-    mixedText += !a.unambiguousText;
+    deleted += a.deleted, duplicate += a.duplicateKey, mixedText += !a.unambiguousText;
   }
   for (const ItemTruth& i : truth_->items) blankItems += i.key.empty();
   std::set<std::pair<std::string, int>> seen;
