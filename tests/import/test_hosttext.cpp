@@ -149,26 +149,20 @@ TEST(HostIntValue, ReadsRoundsHalvesToEvenOrThrows) {
 // Display order (Windows-1255) to reading order (UTF-8).
 TEST(BidiReorder, DisplayOrderToReadingOrder) {
   const std::pair<std::string, const char*> cases[] = {
-      {W("ןהכ השמ"), "משה כהן"},
-      {W("   ןהכ השמ   "), "משה כהן"},
-      {W("ABC Ltd ןהכ"), "כהן ABC Ltd"},
-      {W("(ןהכ) השמ"), "משה (כהן)"},
-      {W("מ\"עב ןהכ"), "כהן בע\"מ"},
-      {W("151 םיאנומשחה"), "החשמונאים 151"},
-      {W("ופי-ביבא לת"), "תל אביב-יפו"},
-      {W("מ\"עב (2004) ןמדירפ"), "פרידמן (2004) בע\"מ"},
+      // clang-format off
+      {W("ןהכ השמ"), "משה כהן"}, {W("   ןהכ השמ   "), "משה כהן"},
+      {W("ABC Ltd ןהכ"), "כהן ABC Ltd"}, {W("(ןהכ) השמ"), "משה (כהן)"},
+      {W("מ\"עב ןהכ"), "כהן בע\"מ"}, {W("151 םיאנומשחה"), "החשמונאים 151"},
+      {W("ופי-ביבא לת"), "תל אביב-יפו"}, {W("מ\"עב (2004) ןמדירפ"), "פרידמן (2004) בע\"מ"},
       // Separators join digits only singly and between two digits; terminators join.
-      {W("03-1234567 ןופלט"), "טלפון 03-1234567"},
-      {W("1.5% החנה"), "הנחה 1.5%"},
-      {W("1..2 א"), "א 2..1"},
-      {W("- השמ -"), "- משה -"},
-      {"  ABC Ltd  ", "ABC Ltd"},
-      {"    ", ""},
+      {W("03-1234567 ןופלט"), "טלפון 03-1234567"}, {W("1.5% החנה"), "הנחה 1.5%"},
+      {W("1..2 א"), "א 2..1"}, {W("- השמ -"), "- משה -"},
+      {"  ABC Ltd  ", "ABC Ltd"}, {"    ", ""},
       {"AB\0C"s, "AB"},
       // Regression: a field padded with zero bytes lost the whole name when the zeros were
       // reordered to the front and the line was cut at the first.
-      {W("ןהכ השמ") + std::string(5, '\0'), "משה כהן"},
-      {W("ןהכ השמ  ") + std::string(3, '\0'), "משה כהן"},
+      {W("ןהכ השמ") + std::string(5, '\0'), "משה כהן"}, {W("ןהכ השמ  ") + std::string(3, '\0'), "משה כהן"},
+      // clang-format on
   };
   for (const auto& [shown, reads] : cases) EXPECT_EQ(U8(BidiReorder(shown)), reads) << U8(shown);
   // Bytes the code page leaves undefined come back as they went in.
@@ -236,19 +230,15 @@ TEST(BidiReorder, RightToLeftRuleAgreesWithIcu) {
 // (Israel) Ltd" came back "Osem )Israel( Ltd"). Those of Hebrew text still turn.
 TEST(ConvertWithBidi, LatinLineWasReadRightToLeftAndItsBracketsMirrored) {
   const std::pair<const char*, const char*> cases[] = {
-      {"Studio 54", "Studio 54"},
-      {"PO Box 123", "PO Box 123"},
-      {"Room 5, Floor 2", "Room 5, Floor 2"},
-      {"Ref 12/07", "Ref 12/07"},
-      {"03-1234567, 050-7654321", "03-1234567, 050-7654321"},
-      {"Osem (Israel) Ltd", "Osem (Israel) Ltd"},
-      {"[Tadiran] <1995>", "[Tadiran] <1995>"},
-      {"IBM (Israel) תרבח", "חברת IBM (Israel)"},
-      {"מ\"עב Osem (Israel)", "Osem (Israel) בע\"מ"},
-      {"(ןהכ) השמ      ", "משה (כהן)"},
-      {"Intel (ןהכ) השמ", "משה (כהן) Intel"},
-      {"15 לדגמה 'חר", "רח' המגדל 15"},
+      // clang-format off
+      {"Studio 54", "Studio 54"}, {"PO Box 123", "PO Box 123"},
+      {"Room 5, Floor 2", "Room 5, Floor 2"}, {"Ref 12/07", "Ref 12/07"},
+      {"03-1234567, 050-7654321", "03-1234567, 050-7654321"}, {"Osem (Israel) Ltd", "Osem (Israel) Ltd"},
+      {"[Tadiran] <1995>", "[Tadiran] <1995>"}, {"IBM (Israel) תרבח", "חברת IBM (Israel)"},
+      {"מ\"עב Osem (Israel)", "Osem (Israel) בע\"מ"}, {"(ןהכ) השמ      ", "משה (כהן)"},
+      {"Intel (ןהכ) השמ", "משה (כהן) Intel"}, {"15 לדגמה 'חר", "רח' המגדל 15"},
       {"                    ", ""},
+      // clang-format on
   };
   for (const auto& [shown, reads] : cases) {
     EXPECT_EQ(U8(ConvertWithBidi(Host("  "s + shown + " "))), reads) << shown;
