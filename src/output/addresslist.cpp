@@ -1,6 +1,6 @@
 // The address list: a dated table of the recipients with their count and the number of
 // label pages that printing them would take.
-#include "output/output.h"
+#include "output/outputinternal.h"
 #include "select/select.h"
 
 #include "workdb/engine.h"

@@ -4,7 +4,7 @@
 #include <cmath>
 
 #include "import/codepage.h"
-#include "output/output.h"
+#include "output/outputinternal.h"
 #include "select/select.h"
 
 #include "workdb/engine.h"

@@ -15,7 +15,7 @@
 
 #include "import/codepage.h"
 #include "import/hosttext.h"
-#include "output/output.h"
+#include "output/outputinternal.h"
 
 namespace zdr {
 namespace output_internal {

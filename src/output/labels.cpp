@@ -2,7 +2,7 @@
 // each recipient filling `copies` consecutive cells from the start position on.
 #include <algorithm>
 
-#include "output/output.h"
+#include "output/outputinternal.h"
 #include "select/select.h"
 
 #include "workdb/engine.h"

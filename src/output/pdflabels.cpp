@@ -21,7 +21,7 @@
 #include <unordered_map>
 #include <vector>
 
-#include "output/output.h"
+#include "output/outputinternal.h"
 #include "select/select.h"
 #include "workdb/engine.h"
 

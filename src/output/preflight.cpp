@@ -7,7 +7,7 @@
 #include <unordered_map>
 
 #include "import/codepage.h"
-#include "output/output.h"
+#include "output/outputinternal.h"
 #include "select/select.h"
 #include "workdb/engine.h"
 

@@ -20,7 +20,7 @@
 #include <vector>
 
 #include "import/codepage.h"
-#include "output/output.h"
+#include "output/outputinternal.h"
 
 extern char** environ;
 

@@ -4,12 +4,10 @@
 #pragma once
 
 #include <gtest/gtest.h>
-#include <stdlib.h>
 
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
-#include <iterator>
 #include <optional>
 #include <string>
 #include <vector>
@@ -18,13 +16,12 @@
 #include "control/userseam.h"
 #include "import/codepage.h"
 #include "import/doctypes.h"
-#include "output/output.h"
-#include "output/outputdefs.h"
+#include "output/outputinternal.h"
+#include "support/files.h"
 #include "support/recordingseam.h"
 #include "support/scratchtemp.h"
-#include "workdb/schema.h"
-
 #include "workdb/engine.h"
+#include "workdb/schema.h"
 
 namespace zdr::test {
 
@@ -42,25 +39,11 @@ struct HeadRow {
   Text customerName, address1, address2, detailsLine1;
 };
 
-inline std::string ReadBytes(const std::filesystem::path& p) {
-  std::ifstream in(p, std::ios::binary);
-  return std::string((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
-}
-
 // Joins lines with CR LF after each.
 inline std::string Lines(const std::vector<std::string>& lines) {
   std::string out;
   for (const auto& l : lines) out += l + "\r\n";
   return out;
-}
-
-inline size_t Count(std::string_view text, std::string_view what) {
-  size_t n = 0;
-  for (size_t at = text.find(what); at != std::string_view::npos;
-       at = text.find(what, at + what.size())) {
-    ++n;
-  }
-  return n;
 }
 
 inline std::vector<AccountRow> NumberedAccounts(int n) {
