@@ -9,6 +9,7 @@
 #include <functional>
 #include <optional>
 #include <set>
+#include <sstream>
 #include <stdexcept>
 #include <string>
 #include <tuple>
@@ -26,60 +27,26 @@ namespace {
 namespace fs = std::filesystem;
 using KeyValues = std::vector<std::pair<std::string, std::string>>;
 
+// "key=value" words split at blanks.
+KeyValues Pairs(const std::string& text) {
+  KeyValues out;
+  std::stringstream in(text);
+  for (std::string word; in >> word;)
+    out.emplace_back(word.substr(0, word.find('=')), word.substr(word.find('=') + 1));
+  return out;
+}
+
 // Every saved key in its fixed order, each with a value other than the designed one.
-const KeyValues kChanged = {{"UseCatCode", "1"},
-                            {"FromSort", "100"},
-                            {"ToSort", "199"},
-                            {"UseAccKey", "2"},
-                            {"CutOff1", "1"},
-                            {"CutOff2", "א"},
-                            {"CutOff3", "ב"},
-                            {"CutOff4", "9"},
-                            {"UseCutOff", "1"},
-                            {"FromCrd", "1000"},
-                            {"ToCrd", "1999"},
-                            {"UseCity", "1"},
-                            {"City", "חיפה"},
-                            {"UsePhone", "1"},
-                            {"Phone", "04-8"},
-                            {"UseAgent", "1"},
-                            {"FromAgent", "3"},
-                            {"ToAgent", "7"},
-                            {"UseDates", "1"},
-                            {"FromDate", "01/02/2003"},
-                            {"ToDate", "31/12/2003"},
-                            {"DocType", "27"},
-                            {"ByDoc", "1"},
-                            {"UseJournal", "1"},
-                            {"FromJournal", "10"},
-                            {"ToJournal", "20"},
-                            {"UseTransType", "1"},
-                            {"TransType", "חש"},
-                            {"UseTransDates", "1"},
-                            {"FromTransDate", "01/01/2001"},
-                            {"FromToDate", "02/02/2002"},
-                            {"UseTransVDate", "2"},
-                            {"FromTransVDate", "03/03/2003"},
-                            {"FromToVDate", "04/04/2004"},
-                            {"Rows", "10"},
-                            {"Cols", "2"},
-                            {"Copies", "3"},
-                            {"SortBy", "7"},
-                            {"SortDir", "1"},
-                            {"ReadTempTrans", "1"},
-                            {"InAccounts", "1"},
-                            {"AddressFrom", "-1"},
-                            {"UseTitle0", "1"},
-                            {"UseTitle1", "2"},
-                            {"UseTitle2", "1"},
-                            {"UseTitle3", "2"},
-                            {"UseTitle4", "1"},
-                            {"UseTitle5", "2"},
-                            {"UseTitle6", "1"},
-                            {"UseTitle7", "1"},
-                            {"UseTitle8", "1"},
-                            {"UseLogo0", "1"},
-                            {"UseLogo1", "2"}};
+const KeyValues kChanged = Pairs(
+    "UseCatCode=1 FromSort=100 ToSort=199 UseAccKey=2 CutOff1=1 CutOff2=א CutOff3=ב "
+    "CutOff4=9 UseCutOff=1 FromCrd=1000 ToCrd=1999 UseCity=1 City=חיפה UsePhone=1 "
+    "Phone=04-8 UseAgent=1 FromAgent=3 ToAgent=7 UseDates=1 FromDate=01/02/2003 "
+    "ToDate=31/12/2003 DocType=27 ByDoc=1 UseJournal=1 FromJournal=10 ToJournal=20 "
+    "UseTransType=1 TransType=חש UseTransDates=1 FromTransDate=01/01/2001 "
+    "FromToDate=02/02/2002 UseTransVDate=2 FromTransVDate=03/03/2003 "
+    "FromToVDate=04/04/2004 Rows=10 Cols=2 Copies=3 SortBy=7 SortDir=1 ReadTempTrans=1 "
+    "InAccounts=1 AddressFrom=-1 UseTitle0=1 UseTitle1=2 UseTitle2=1 UseTitle3=2 "
+    "UseTitle4=1 UseTitle5=2 UseTitle6=1 UseTitle7=1 UseTitle8=1 UseLogo0=1 UseLogo1=2");
 
 void Put(SettingsStore& store, const KeyValues& values) {
   for (const auto& [key, value] : values) store.Save(kSettingsApp, kParamsSection, key, value);
@@ -130,25 +97,10 @@ TEST(ParamsTest, EveryKeyLoadsAndSavesInItsFixedOrder) {
 // A value the control refuses stops the load at its key: the keys before it are loaded, it
 // and the keys after it keep what the panel had.
 TEST(ParamsTest, RefusedValueStopsTheLoadAtItsKey) {
-  const KeyValues refused = {{"UseCatCode", "3"},
-                             {"UseCatCode", "-1"},
-                             {"UseCatCode", ""},
-                             {"UseCatCode", "1.5"},
-                             {"DocType", "28"},
-                             {"DocType", "-2"},
-                             {"ByDoc", "2"},
-                             {"SortDir", "2"},
-                             {"InAccounts", "2"},
-                             {"AddressFrom", "2"},
-                             {"SortBy", "8"},
-                             {"SortBy", "x"},
-                             {"SortBy", ""},
-                             {"UseLogo1", "1e0"},
-                             {"ByDoc", "+-1"},
-                             {"ByDoc", "+"},
-                             {"UseCity", "yes"},
-                             {"SortBy", "12"},
-                             {"SortBy", "99999999999999999999"}};
+  const KeyValues refused = Pairs(
+      "UseCatCode=3 UseCatCode=-1 UseCatCode= UseCatCode=1.5 DocType=28 DocType=-2 "
+      "ByDoc=2 SortDir=2 InAccounts=2 AddressFrom=2 SortBy=8 SortBy=x SortBy= "
+      "UseLogo1=1e0 ByDoc=+-1 ByDoc=+ UseCity=yes SortBy=12 SortBy=99999999999999999999");
   const KeyValues designed = Saved(Panel{});
   for (const auto& [key, value] : refused) {
     SCOPED_TRACE(key + "=" + value);

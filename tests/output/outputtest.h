@@ -46,6 +46,17 @@ inline std::string Lines(const std::vector<std::string>& lines) {
   return out;
 }
 
+// A file of tests/data/output as the outputs write it: its lines end in CR LF, its text is
+// Windows-1255 (the file itself is UTF-8 with LF line ends, to read and to diff).
+inline std::string Golden(const std::string& name) {
+  std::string out;
+  for (char c : ReadBytes(std::string(ZDR_TEST_DATA) + "/output/" + name)) {
+    if (c == '\n') out += '\r';
+    out += c;
+  }
+  return Utf8ToWin1255(out);
+}
+
 inline std::vector<AccountRow> NumberedAccounts(int n) {
   std::vector<AccountRow> rows;
   for (int i = 1; i <= n; ++i) {
