@@ -21,8 +21,8 @@
 #include <utility>
 #include <vector>
 
-#include "workdb/collation.h"
-#include "workdb/engine.h"
+#include "engine/collation.h"
+#include "engine/engine.h"
 
 namespace {
 

@@ -29,15 +29,15 @@
 #include <string_view>
 #include <vector>
 
+#include "common/panel.h"
+#include "common/userseam.h"
 #include "control/control.h"
 #include "control/dataload.h"
-#include "control/panel.h"
-#include "control/userseam.h"
-#include "import/doctypes.h"
-#include "import/hostfile.h"
+#include "engine/collation.h"
+#include "engine/engine.h"
+#include "hostfile/doctypes.h"
+#include "hostfile/hostfile.h"
 #include "import/importers.h"
-#include "workdb/collation.h"
-#include "workdb/engine.h"
 #include "workdb/schema.h"
 #include "zdrgen/generator.h"
 

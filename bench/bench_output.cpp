@@ -8,15 +8,15 @@
 #include <filesystem>
 #include <string>
 
-#include "control/panel.h"
-#include "import/doctypes.h"
+#include "common/panel.h"
+#include "hostfile/doctypes.h"
 #include "output/output.h"
 #include "output/pdflabels.h"
 #include "output/preflight.h"
 #include "select/select.h"
 #include "workdb/schema.h"
 
-#include "workdb/engine.h"
+#include "engine/engine.h"
 
 namespace {
 

@@ -17,10 +17,10 @@
 #include <utility>
 #include <vector>
 
-#include "control/consoleseam.h"
+#include "app/consoleseam.h"
 #include "control/control.h"
-#include "control/qtsettings.h"
 #include "control/settings.h"
+#include "qtstore/qtsettings.h"
 
 namespace zdr {
 namespace {

@@ -6,7 +6,7 @@
 #include <vector>
 
 #include "app/cli.h"
-#include "control/qtsettings.h"
+#include "qtstore/qtsettings.h"
 
 #ifdef ZDR_WITH_GUI
 #include "gui/mainwindow.h"

@@ -8,9 +8,9 @@
 
 #include "control/control.h"
 #include "control/dataload.h"
+#include "engine/engine.h"
 #include "output/output.h"
 #include "select/select.h"
-#include "workdb/engine.h"
 #include "workdb/schema.h"
 #include "workdb/worklock.h"
 

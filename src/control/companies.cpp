@@ -4,9 +4,9 @@
 #include <fstream>
 #include <system_error>
 
-#include "import/codepage.h"
-#include "import/hostfile.h"
-#include "import/hosttext.h"
+#include "hostfile/hostfile.h"
+#include "hosttext/codepage.h"
+#include "hosttext/hosttext.h"
 
 namespace zdr {
 

@@ -8,12 +8,12 @@
 #include <optional>
 #include <string>
 
-#include "control/panel.h"
-#include "control/userseam.h"
-#include "import/doctypes.h"
+#include "common/panel.h"
+#include "common/userseam.h"
+#include "engine/engine.h"
+#include "hostfile/doctypes.h"
 #include "output/outputdefs.h"
 #include "output/preflight.h"
-#include "workdb/engine.h"
 
 namespace zdr {
 

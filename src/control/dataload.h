@@ -2,10 +2,10 @@
 // the other host data the panel's criteria need.
 #pragma once
 
+#include "common/panel.h"
+#include "common/userseam.h"
 #include "control/control.h"
-#include "control/panel.h"
-#include "control/userseam.h"
-#include "import/doctypes.h"
+#include "hostfile/doctypes.h"
 
 namespace zdr {
 

@@ -9,7 +9,7 @@
 #include <string>
 #include <utility>
 
-#include "import/doctypes.h"
+#include "hostfile/doctypes.h"
 
 namespace zdr {
 

@@ -14,7 +14,7 @@
 #include <tuple>
 #include <vector>
 
-#include "control/panel.h"
+#include "common/panel.h"
 #include "output/outputdefs.h"
 
 namespace zdr {
@@ -44,7 +44,7 @@ inline constexpr int kInAccountsListSize = 2;
 inline constexpr int kAddressFromListSize = 2;
 
 // Where values are kept. Implementations: MemorySettingsStore (below) and QtSettingsStore
-// (control/qtsettings.h).
+// (qtstore/qtsettings.h).
 class SettingsStore {
  public:
   virtual ~SettingsStore() = default;

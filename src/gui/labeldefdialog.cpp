@@ -17,7 +17,7 @@
 #include "gui/labelstockbox.h"
 #include "gui/qtseam.h"
 #include "gui/widgets.h"
-#include "import/hosttext.h"
+#include "hosttext/hosttext.h"
 
 namespace zdr::gui {
 

@@ -8,7 +8,7 @@
 #include <optional>
 #include <string>
 
-#include "output/labelstock.h"
+#include "common/labelstock.h"
 
 class QCheckBox;
 class QComboBox;

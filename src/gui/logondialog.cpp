@@ -15,7 +15,7 @@
 #include "gui/opendirdialog.h"
 #include "gui/qtseam.h"
 #include "gui/widgets.h"
-#include "import/hostfile.h"
+#include "hostfile/hostfile.h"
 
 namespace zdr::gui {
 

@@ -17,9 +17,9 @@
 #include <utility>
 #include <vector>
 
+#include "common/value.h"
 #include "control/control.h"
 #include "gui/qtseam.h"
-#include "workdb/value.h"
 
 class QComboBox;
 class QGroupBox;

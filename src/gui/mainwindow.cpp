@@ -3,9 +3,9 @@
 #include <QApplication>
 #include <QMainWindow>
 
-#include "control/qtsettings.h"
 #include "gui/maincard.h"
 #include "gui/qtseam.h"
+#include "qtstore/qtsettings.h"
 
 namespace zdr::gui {
 

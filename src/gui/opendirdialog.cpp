@@ -16,7 +16,7 @@
 #include "control/control.h"
 #include "gui/qtseam.h"
 #include "gui/widgets.h"
-#include "import/hosttext.h"
+#include "hosttext/hosttext.h"
 
 namespace zdr::gui {
 

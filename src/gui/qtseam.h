@@ -11,7 +11,7 @@
 #include <string>
 #include <string_view>
 
-#include "control/userseam.h"
+#include "common/userseam.h"
 
 class QCoreApplication;
 class QFileDialog;

@@ -8,11 +8,11 @@
 #include <string_view>
 #include <system_error>
 
-#include "import/hostfile.h"
-#include "import/hosttext.h"
+#include "engine/engine.h"
+#include "hostfile/hostfile.h"
+#include "hosttext/hosttext.h"
 #include "import/importcommon.h"
 #include "import/importers.h"
-#include "workdb/engine.h"
 
 namespace zdr {
 

@@ -6,9 +6,9 @@
 #include <system_error>
 #include <thread>
 
-#include "import/codepage.h"
-#include "import/hosttext.h"
-#include "workdb/jetsql.h"
+#include "engine/jetsql.h"
+#include "hosttext/codepage.h"
+#include "hosttext/hosttext.h"
 
 namespace zdr::importing {
 

@@ -17,11 +17,11 @@
 #include <string_view>
 #include <vector>
 
-#include "control/panel.h"
-#include "control/userseam.h"
-#include "import/hostfile.h"
-#include "workdb/engine.h"
-#include "workdb/value.h"
+#include "common/panel.h"
+#include "common/userseam.h"
+#include "common/value.h"
+#include "engine/engine.h"
+#include "hostfile/hostfile.h"
 
 namespace zdr::importing {
 

@@ -19,9 +19,9 @@
 #include <cstdint>
 #include <string>
 
-#include "control/panel.h"
-#include "control/userseam.h"
-#include "import/doctypes.h"
+#include "common/panel.h"
+#include "common/userseam.h"
+#include "hostfile/doctypes.h"
 
 namespace zdr {
 

@@ -5,11 +5,11 @@
 #include <string>
 #include <string_view>
 
-#include "import/hostfile.h"
-#include "import/hosttext.h"
+#include "engine/engine.h"
+#include "hostfile/hostfile.h"
+#include "hosttext/hosttext.h"
 #include "import/importcommon.h"
 #include "import/importers.h"
-#include "workdb/engine.h"
 
 namespace zdr {
 

@@ -6,12 +6,12 @@
 #include <string>
 #include <string_view>
 
-#include "import/codepage.h"
-#include "import/hostfile.h"
-#include "import/hosttext.h"
+#include "engine/engine.h"
+#include "hostfile/hostfile.h"
+#include "hosttext/codepage.h"
+#include "hosttext/hosttext.h"
 #include "import/importcommon.h"
 #include "import/importers.h"
-#include "workdb/engine.h"
 
 namespace zdr {
 

@@ -3,7 +3,7 @@
 #include "output/outputinternal.h"
 #include "select/select.h"
 
-#include "workdb/engine.h"
+#include "engine/engine.h"
 
 namespace zdr {
 namespace {

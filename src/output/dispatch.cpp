@@ -3,11 +3,11 @@
 // or a line break of its own.
 #include <cmath>
 
-#include "import/codepage.h"
+#include "hosttext/codepage.h"
 #include "output/outputinternal.h"
 #include "select/select.h"
 
-#include "workdb/engine.h"
+#include "engine/engine.h"
 
 namespace zdr {
 namespace output_internal {

@@ -13,8 +13,8 @@
 #include <filesystem>
 #include <memory>
 
-#include "import/codepage.h"
-#include "import/hosttext.h"
+#include "hosttext/codepage.h"
+#include "hosttext/hosttext.h"
 #include "output/outputinternal.h"
 
 namespace zdr {

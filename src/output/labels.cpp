@@ -5,7 +5,7 @@
 #include "output/outputinternal.h"
 #include "select/select.h"
 
-#include "workdb/engine.h"
+#include "engine/engine.h"
 
 namespace zdr {
 

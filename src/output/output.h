@@ -18,12 +18,12 @@
 #include <string>
 #include <vector>
 
-#include "control/panel.h"
-#include "control/userseam.h"
-#include "import/doctypes.h"
+#include "common/panel.h"
+#include "common/userseam.h"
+#include "common/value.h"
+#include "hostfile/doctypes.h"
 #include "output/outputdefs.h"
 #include "output/preflight.h"
-#include "workdb/value.h"
 
 namespace zdr {
 

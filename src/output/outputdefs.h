@@ -5,7 +5,7 @@
 #include <cstdint>
 #include <string>
 
-#include "output/labelstock.h"
+#include "common/labelstock.h"
 
 namespace zdr {
 

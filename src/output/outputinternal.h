@@ -8,9 +8,9 @@
 #include <string>
 #include <string_view>
 
-#include "control/panel.h"
+#include "common/panel.h"
+#include "common/value.h"
 #include "output/output.h"
-#include "workdb/value.h"
 
 namespace zdr {
 namespace db {

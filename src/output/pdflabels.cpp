@@ -21,9 +21,9 @@
 #include <unordered_map>
 #include <vector>
 
+#include "engine/engine.h"
 #include "output/outputinternal.h"
 #include "select/select.h"
-#include "workdb/engine.h"
 
 namespace zdr {
 namespace {

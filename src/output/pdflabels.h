@@ -22,10 +22,10 @@
 
 #include <string>
 
-#include "control/panel.h"
-#include "control/userseam.h"
-#include "import/doctypes.h"
-#include "output/labelstock.h"
+#include "common/labelstock.h"
+#include "common/panel.h"
+#include "common/userseam.h"
+#include "hostfile/doctypes.h"
 #include "output/outputdefs.h"
 
 namespace zdr {

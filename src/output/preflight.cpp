@@ -6,10 +6,10 @@
 #include <stdexcept>
 #include <unordered_map>
 
-#include "import/codepage.h"
+#include "engine/engine.h"
+#include "hosttext/codepage.h"
 #include "output/outputinternal.h"
 #include "select/select.h"
-#include "workdb/engine.h"
 
 namespace zdr {
 namespace {

@@ -22,9 +22,9 @@
 #include <string_view>
 #include <vector>
 
-#include "control/panel.h"
-#include "control/userseam.h"
-#include "import/doctypes.h"
+#include "common/panel.h"
+#include "common/userseam.h"
+#include "hostfile/doctypes.h"
 
 namespace zdr::db {
 class Snapshot;

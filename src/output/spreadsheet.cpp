@@ -19,7 +19,7 @@
 #include <sstream>
 #include <vector>
 
-#include "import/codepage.h"
+#include "hosttext/codepage.h"
 #include "output/outputinternal.h"
 
 extern char** environ;

@@ -2,7 +2,7 @@
 
 #include <variant>
 
-#include "workdb/engine.h"
+#include "engine/engine.h"
 
 namespace zdr {
 

@@ -4,9 +4,9 @@
 
 #include <string>
 
-#include "control/panel.h"
-#include "import/doctypes.h"
-#include "workdb/value.h"
+#include "common/panel.h"
+#include "common/value.h"
+#include "hostfile/doctypes.h"
 
 namespace zdr {
 

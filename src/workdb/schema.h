@@ -6,8 +6,8 @@
 #include <string>
 #include <vector>
 
-#include "control/userseam.h"
-#include "workdb/engine.h"
+#include "common/userseam.h"
+#include "engine/engine.h"
 
 namespace zdr {
 

@@ -18,7 +18,7 @@
 #include <string>
 #include <vector>
 
-#include "import/codepage.h"
+#include "hosttext/codepage.h"
 #include "support/files.h"
 #include "support/scratchtemp.h"
 #include "workdb/worklock.h"

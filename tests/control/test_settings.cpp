@@ -16,8 +16,8 @@
 #include <utility>
 #include <vector>
 
-#include "control/qtsettings.h"
 #include "control/settings.h"
+#include "qtstore/qtsettings.h"
 #include "support/files.h"
 #include "support/scratchtemp.h"
 

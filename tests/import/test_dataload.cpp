@@ -12,11 +12,11 @@
 #include <tuple>
 #include <vector>
 
+#include "common/panel.h"
 #include "control/control.h"
 #include "control/dataload.h"
-#include "control/panel.h"
-#include "import/codepage.h"
-#include "import/doctypes.h"
+#include "hostfile/doctypes.h"
+#include "hosttext/codepage.h"
 #include "output/output.h"
 #include "support/importtest.h"
 #include "zdrgen/generator.h"

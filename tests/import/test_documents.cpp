@@ -5,12 +5,12 @@
 #include <string>
 #include <vector>
 
-#include "control/panel.h"
-#include "import/codepage.h"
-#include "import/doctypes.h"
+#include "common/panel.h"
+#include "common/value.h"
+#include "hostfile/doctypes.h"
+#include "hosttext/codepage.h"
 #include "import/importers.h"
 #include "support/importtest.h"
-#include "workdb/value.h"
 #include "zdrgen/generator.h"
 
 namespace zdr {

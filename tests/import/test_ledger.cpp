@@ -8,7 +8,7 @@
 #include <string>
 #include <vector>
 
-#include "control/panel.h"
+#include "common/panel.h"
 #include "import/importers.h"
 #include "support/importtest.h"
 #include "zdrgen/generator.h"

@@ -12,15 +12,15 @@
 #include <string>
 #include <vector>
 
-#include "control/panel.h"
-#include "control/userseam.h"
-#include "import/codepage.h"
-#include "import/doctypes.h"
+#include "common/panel.h"
+#include "common/userseam.h"
+#include "engine/engine.h"
+#include "hostfile/doctypes.h"
+#include "hosttext/codepage.h"
 #include "output/outputinternal.h"
 #include "support/files.h"
 #include "support/recordingseam.h"
 #include "support/scratchtemp.h"
-#include "workdb/engine.h"
 #include "workdb/schema.h"
 
 namespace zdr::test {

@@ -9,7 +9,7 @@
 #include <cstring>
 #include <regex>
 
-#include "output/labelstock.h"
+#include "common/labelstock.h"
 #include "output/outputtest.h"
 #include "output/pdflabels.h"
 

@@ -9,10 +9,10 @@
 #include <string>
 #include <tuple>
 
-#include "import/doctypes.h"
+#include "engine/jetsql.h"
+#include "hostfile/doctypes.h"
 #include "select/select.h"
 #include "support/statements.h"
-#include "workdb/jetsql.h"
 
 namespace zdr {
 namespace {

@@ -16,13 +16,13 @@
 
 #include "control/control.h"
 #include "control/dataload.h"
-#include "import/codepage.h"
-#include "import/hosttext.h"
+#include "engine/collation.h"
+#include "engine/engine.h"
+#include "hosttext/codepage.h"
+#include "hosttext/hosttext.h"
 #include "select/select.h"
 #include "support/recordingseam.h"
 #include "support/scratchtemp.h"
-#include "workdb/collation.h"
-#include "workdb/engine.h"
 #include "zdrgen/generator.h"
 
 namespace zdr {

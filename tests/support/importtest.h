@@ -12,9 +12,9 @@
 #include <string_view>
 #include <vector>
 
+#include "engine/engine.h"
 #include "support/recordingseam.h"
 #include "support/scratchtemp.h"
-#include "workdb/engine.h"
 #include "workdb/schema.h"
 #include "zdrgen/generator.h"
 

@@ -6,7 +6,7 @@
 #include <string_view>
 #include <vector>
 
-#include "control/userseam.h"
+#include "common/userseam.h"
 
 namespace zdr::test {
 

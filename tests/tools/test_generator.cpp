@@ -13,10 +13,10 @@
 #include <stdexcept>
 #include <string>
 
-#include "import/codepage.h"
-#include "import/doctypes.h"
-#include "import/hostfile.h"
-#include "import/hosttext.h"
+#include "hostfile/doctypes.h"
+#include "hostfile/hostfile.h"
+#include "hosttext/codepage.h"
+#include "hosttext/hosttext.h"
 #include "support/scratchtemp.h"
 
 namespace zdrgen {

@@ -1,0 +1,618 @@
+// The database engine: its files, table definitions, appended rows and what they refuse,
+// snapshots, statements, links and stored queries, and the Hebrew collation and Jet LIKE
+// that every connection carries. The tables the system defines are checked in test_schema.
+#include <gtest/gtest.h>
+#include <sqlite3.h>
+
+#include <algorithm>
+#include <cmath>
+#include <filesystem>
+#include <fstream>
+#include <functional>
+#include <optional>
+#include <string>
+#include <tuple>
+#include <vector>
+
+#include "engine/collation.h"
+#include "engine/engine.h"
+#include "support/scratchtemp.h"
+
+namespace zdr::db {
+namespace {
+
+namespace fs = std::filesystem;
+using Texts = std::vector<std::string>;
+
+constexpr const char* kLocale = ";LANGID=0x040D;CP=1255;COUNTRY=0";
+
+TableDef AccountDef() {
+  return TableDef("tAccount")
+      .Field("AccountKey", FieldType::Text, 20)
+      .Field("AccountName", FieldType::Text, 100)
+      .Field("CategoryCode", FieldType::Text, 3)
+      .Field("City", FieldType::Text, 50)
+      .Field("Include", FieldType::Boolean)
+      .Field("SortByKey", FieldType::Text, 20)
+      .Field("SortByKeyVal", FieldType::Double)
+      .Index("PrimaryKey", {"AccountKey"}, true, true)
+      .Index("SortByKey", {"SortByKey"}, false, true);
+}
+
+TableDef NumbersDef() {
+  return TableDef("tNumbers")
+      .Field("B", FieldType::Byte)
+      .Field("I", FieldType::Integer)
+      .Field("L", FieldType::Long)
+      .Field("D", FieldType::Double)
+      .Field("When", FieldType::Date)
+      .Field("Flag", FieldType::Boolean)
+      .Field("Code", FieldType::Text, 3);
+}
+
+struct Outcome {
+  int number = 0;  // 0 when nothing was raised
+  std::string description;
+};
+Outcome Try(const std::function<void()>& f) {
+  try {
+    f();
+  } catch (const EngineError& e) {
+    return {e.number(), e.description()};
+  }
+  return {};
+}
+int ErrorOf(const std::function<void()>& f) {
+  return Try(f).number;
+}
+
+// Appends one account; returns the engine error number, 0 when stored.
+int AddAccount(TableRecordset& rs, const std::string& key, const std::string& name,
+               const std::string& city = "", std::optional<std::string> sortKey = std::nullopt) {
+  return ErrorOf([&] {
+    rs.AddNew();
+    rs.SetText(rs.FieldIndex("AccountKey"), key);
+    rs.SetText(rs.FieldIndex("AccountName"), name);
+    rs.SetText(rs.FieldIndex("SortByKey"), sortKey.value_or(key));
+    if (!city.empty()) rs.SetText(rs.FieldIndex("City"), city);
+    rs.SetBool(rs.FieldIndex("Include"), true);
+    rs.Update();
+  });
+}
+
+// The first column of every row, as text.
+Texts Column(Database& db, const std::string& sql) {
+  Texts out;
+  for (Snapshot s = db.OpenSnapshot(sql); !s.AtEnd(); s.MoveNext()) {
+    const Value& v = s.Field(0);
+    out.push_back(IsNull(v)                            ? "<null>"
+                  : std::holds_alternative<int64_t>(v) ? std::to_string(std::get<int64_t>(v))
+                                                       : std::get<std::string>(v));
+  }
+  return out;
+}
+
+std::string Count(Database& db, const std::string& from) {
+  return Column(db, "SELECT Count(*) FROM " + from).at(0);
+}
+
+class EngineTest : public ::testing::Test {
+ protected:
+  fs::path File(const std::string& name) const { return temp_.dir() / name; }
+  test::ScratchTemp temp_;
+};
+
+// ---------------------------------------------------------------------------------------
+// Files and definitions
+
+TEST_F(EngineTest, FilesAreMadeOnlyNewAndOpenedOnlyWhenTheEngineMadeThem) {
+  { std::ofstream(File("old.DB")) << "keep me"; }
+  { std::ofstream(File("junk.DB"), std::ios::binary) << std::string(5000, '\x5a'); }
+  // A hot journal left by a crashed run of an earlier file of the same name is not replayed.
+  { std::ofstream(File("d.DB-journal"), std::ios::binary) << std::string(4096, '\x01'); }
+  sqlite3* raw = nullptr;  // an SQLite file of another program
+  ASSERT_EQ(sqlite3_open(File("plain.db").c_str(), &raw), SQLITE_OK);
+  sqlite3_exec(raw, "CREATE TABLE t (a)", nullptr, nullptr, nullptr);
+  sqlite3_close(raw);
+  const std::pair<std::function<void()>, int> cases[] = {
+      {[&] { Database::Create(File("old.DB"), kLocale); }, kErrFileExists},
+      {[&] { Database::Create(File("no/such/dir/x.DB"), kLocale); }, kErrCannotOpen},
+      {[&] { Database::Open(File("missing.DB")); }, kErrCannotOpen},
+      {[&] { Database::Open(File("junk.DB")); }, kErrCannotOpen},
+      {[&] { Database::Open(File("plain.db")); }, kErrCannotOpen}};
+  for (size_t i = 0; i < std::size(cases); ++i) {
+    EXPECT_EQ(ErrorOf(cases[i].first), cases[i].second) << i;
+  }
+  EXPECT_NE(Try(cases[2].first).description.find("missing.DB"), std::string::npos);
+  EXPECT_FALSE(fs::exists(File("missing.DB")));
+  std::ifstream old(File("old.DB"));
+  std::string content;
+  std::getline(old, content);
+  EXPECT_EQ(content, "keep me");
+  {
+    Database db = Database::Create(File("d.DB"), kLocale);
+    EXPECT_FALSE(fs::exists(File("d.DB-journal")));
+    db.CreateTable(AccountDef());
+    db.Close();
+    EXPECT_FALSE(db.IsOpen());
+  }
+  Database db = Database::Open(File("d.DB"));
+  EXPECT_EQ(db.Path(), File("d.DB"));
+  EXPECT_TRUE(db.HasTable("TACCOUNT"));
+  EXPECT_FALSE(db.HasTable("tItem"));
+  EXPECT_EQ(db.Describe("taccount").name, "tAccount");
+  EXPECT_EQ(ErrorOf([&] { db.Describe("tNothing"); }), kErrNoSuchObject);
+}
+
+TEST_F(EngineTest, BadDefinitionsAreRefusedBeforeAnythingIsCreated) {
+  Database db = Database::Create(File("bad.DB"), kLocale);
+  db.CreateTable(AccountDef());
+  auto w = [] { return TableDef("tW").Field("A", FieldType::Long); };
+  const std::pair<TableDef, int> cases[] = {
+      {AccountDef(), kErrObjectExists},
+      {TableDef("TACCOUNT").Field("A", FieldType::Long), kErrObjectExists},
+      {TableDef("_zdr_fields").Field("A", FieldType::Long), kErrEngine},
+      {TableDef("tW"), kErrEngine},
+      {TableDef("tW").Field("A", FieldType::Text, 0), kErrEngine},
+      {TableDef("tW").Field("A", FieldType::Text, 256), kErrEngine},
+      {w().Field("a", FieldType::Long), kErrObjectExists},
+      {w().Index("PrimaryKey", {"B"}, true, true), kErrNoSuchField},
+      {w().Index("X", {"A"}, false, false).Index("x", {"A"}, false, true), kErrObjectExists},
+      {w().Field("B", FieldType::Long).Index("P", {"A"}, true, true).Index("Q", {"B"}, true, true),
+       kErrEngine}};
+  for (size_t i = 0; i < std::size(cases); ++i) {
+    EXPECT_EQ(ErrorOf([&] { db.CreateTable(cases[i].first); }), cases[i].second) << i;
+  }
+  EXPECT_FALSE(db.HasTable("tW"));
+}
+
+// ---------------------------------------------------------------------------------------
+// Appending rows
+
+TEST_F(EngineTest, RowsAreCheckedAndConvertedToTheFieldTypes) {
+  Database db = Database::Create(File("r.DB"), kLocale);
+  db.CreateTable(NumbersDef());
+  TableRecordset rs = db.OpenTable("tNumbers");
+  EXPECT_EQ(ErrorOf([&] { rs.SetInt(0, 1); }), kErrNotEditing);
+  EXPECT_EQ(ErrorOf([&] { rs.Update(); }), kErrNotEditing);
+  EXPECT_EQ(ErrorOf([&] { rs.FieldIndex("Nope"); }), kErrNoSuchField);
+  rs.AddNew();
+  rs.Update();
+  EXPECT_EQ(ErrorOf([&] { rs.Update(); }), kErrNotEditing);  // no second copy of the row
+  auto add = [&](const char* field, const Value& v) {
+    return ErrorOf([&] {
+      rs.AddNew();
+      rs.Set(field, v);
+      rs.Update();
+    });
+  };
+  // Three Hebrew letters (six bytes) fit in Text(3); a cut UTF-8 sequence is no text.
+  const std::pair<std::string, int> texts[] = {{"", kErrZeroLength},
+                                               {"אבג", 0},
+                                               {"אבגד", kErrFieldTooSmall},
+                                               {"abcd", kErrFieldTooSmall},
+                                               {"\xd7", kErrTypeConversion}};
+  for (const auto& [text, error] : texts) EXPECT_EQ(add("code", text), error) << text;
+  using Range = std::tuple<const char*, int64_t, int64_t>;
+  for (auto [field, lo, hi] :
+       {Range{"B", 0, 255}, {"I", -32768, 32767}, {"L", INT32_MIN, INT32_MAX}}) {
+    EXPECT_EQ(add(field, lo) + add(field, hi), 0) << field;
+    EXPECT_EQ(add(field, lo - 1), kErrNumericOverflow) << field;
+    EXPECT_EQ(add(field, hi + 1), kErrNumericOverflow) << field;
+  }
+  EXPECT_EQ(add("I", 32767.5), kErrNumericOverflow);
+  EXPECT_EQ(add("L", NAN), kErrNumericOverflow);
+  EXPECT_EQ(add("L", std::string("12x")), kErrTypeConversion);
+  EXPECT_EQ(Count(db, "tNumbers"), "8");
+  // What is stored is converted as the desktop engine converts.
+  rs.AddNew();
+  rs.SetDouble(rs.FieldIndex("I"), 2.5);  // half to even
+  rs.SetText(rs.FieldIndex("L"), " 42 ");
+  rs.SetInt(rs.FieldIndex("D"), 7);
+  rs.SetDate(rs.FieldIndex("When"), Date::FromParts(2024, 2, 29));
+  rs.SetInt(rs.FieldIndex("Flag"), 5);
+  rs.SetInt(rs.FieldIndex("Code"), 123);
+  rs.Update();
+  rs.AddNew();
+  rs.SetBool(rs.FieldIndex("flag"), false);
+  rs.Update();
+  rs.Close();
+  Snapshot s = db.OpenSnapshot("SELECT * FROM tNumbers WHERE L = 42 OR Flag = 0");
+  EXPECT_EQ(std::get<int64_t>(s.Field("I")), 2);
+  EXPECT_EQ(std::get<double>(s.Field("D")), 7.0);
+  EXPECT_EQ(std::get<double>(s.Field("When")), Date::FromParts(2024, 2, 29).serial);
+  EXPECT_EQ(std::get<int64_t>(s.Field("Flag")), -1);
+  EXPECT_EQ(std::get<std::string>(s.Field("Code")), "123");
+  EXPECT_TRUE(IsNull(s.Field("B")));
+  s.MoveNext();
+  EXPECT_EQ(std::get<int64_t>(s.Field("Flag")), 0);
+}
+
+TEST_F(EngineTest, KeysRefuseRepeatsAndNullsAndTheRefusalNamesTheIndex) {
+  Database db = Database::Create(File("k.DB"), kLocale);
+  db.CreateTable(AccountDef());
+  {
+    TableRecordset rs = db.OpenTable("tAccount");
+    EXPECT_EQ(AddAccount(rs, "100", "כהן") + AddAccount(rs, "200", "לוי"), 0);
+    EXPECT_EQ(AddAccount(rs, "100", "אחר", "", "999"), kErrDuplicateKey);  // primary
+    EXPECT_EQ(AddAccount(rs, "300", "אחר", "", "200"), kErrDuplicateKey);  // SortByKey only
+    // The row stays current after a refusal; each refusal names its index or field.
+    EXPECT_NE(Try([&] { rs.Update(); }).description.find("'SortByKey'"), std::string::npos);
+    rs.SetText(rs.FieldIndex("City"), "");
+    EXPECT_NE(Try([&] { rs.Update(); }).description.find("'City'"), std::string::npos);
+    for (int i = 0; i < 2; ++i) {  // Null in the primary key, never stored
+      rs.AddNew();
+      rs.SetText(rs.FieldIndex("AccountName"), "ללא מפתח");
+      EXPECT_EQ(ErrorOf([&] { rs.Update(); }), kErrNullKey);
+    }
+    for (const char* key : {"1", "2"}) {  // a unique index takes any number of Nulls
+      rs.AddNew();
+      rs.SetText(0, key);
+      EXPECT_EQ(ErrorOf([&] { rs.Update(); }), 0);
+    }
+  }
+  EXPECT_EQ(Column(db, "SELECT AccountName FROM tAccount ORDER BY AccountKey"),
+            (Texts{"<null>", "כהן", "<null>", "לוי"}));
+  EXPECT_EQ(Column(db, "SELECT AccountKey FROM tAccount WHERE SortByKey = \"200\""), Texts{"200"});
+}
+
+// The rows appended stay in the file when the recordset goes, also after its Database;
+// recordsets open together share one transaction that the last one to close commits.
+TEST_F(EngineTest, AppendedRowsReachTheFileWhenTheLastRecordsetCloses) {
+  {
+    Database db = Database::Create(File("t.DB"), kLocale, Durability::Durable);
+    db.CreateTable(AccountDef());
+    db.CreateTable(NumbersDef());
+  }
+  std::optional<TableRecordset> accounts;
+  Database reader = Database::Open(File("t.DB"));
+  {
+    Database db = Database::Open(File("t.DB"));
+    accounts.emplace(db.OpenTable("tAccount"));
+    TableRecordset numbers = db.OpenTable("tNumbers");
+    numbers.AddNew();
+    numbers.Update();
+    EXPECT_EQ(AddAccount(*accounts, "1", "ראשון"), 0);
+    EXPECT_EQ(Count(db, "tAccount"), "1");  // the writer sees its rows, others not yet
+    EXPECT_EQ(Count(reader, "tAccount"), "0");
+    numbers.Close();
+    EXPECT_EQ(Count(reader, "tNumbers"), "0");
+  }
+  EXPECT_EQ(AddAccount(*accounts, "2", "עדיין פתוח"), 0);
+  accounts.reset();
+  EXPECT_EQ(Count(reader, "tAccount"), "2");
+  EXPECT_EQ(Count(reader, "tNumbers"), "1");
+}
+
+// ---------------------------------------------------------------------------------------
+// Snapshots and statements
+
+class SnapshotTest : public EngineTest {
+ protected:
+  void SetUp() override {
+    db_.emplace(Database::Create(File("s.DB"), kLocale));
+    db_->CreateTable(AccountDef());
+    TableRecordset rs = db_->OpenTable("tAccount");
+    AddAccount(rs, "1", "אלף", "חיפה");
+    AddAccount(rs, "2", "בית");
+    AddAccount(rs, "3", "גימל", "אילת");
+  }
+  std::optional<Database> db_;
+};
+
+TEST_F(SnapshotTest, NavigationAndRecordCountFollowTheDesktopEngine) {
+  Snapshot s = db_->OpenSnapshot("SELECT AccountKey FROM tAccount ORDER BY AccountKey");
+  EXPECT_FALSE(s.AtStart() || s.AtEnd());
+  EXPECT_EQ(s.TotalRows(), 3);
+  EXPECT_EQ(s.RecordCount(), 1);
+  EXPECT_EQ(std::get<std::string>(s.Field("AccountKey")), "1");
+  s.MoveNext();
+  EXPECT_EQ(s.RecordCount(), 2);
+  s.MoveLast();
+  EXPECT_EQ(s.RecordCount(), 3);
+  EXPECT_EQ(std::get<std::string>(s.Field(0)), "3");
+  s.MoveNext();
+  EXPECT_TRUE(s.AtEnd());
+  EXPECT_EQ(ErrorOf([&] { s.Field(0); }), kErrNoCurrentRecord);
+  EXPECT_EQ(ErrorOf([&] { s.MoveNext(); }), kErrNoCurrentRecord);
+  s.MovePrevious();
+  EXPECT_EQ(std::get<std::string>(s.Field(0)), "3");
+  s.MoveFirst();
+  s.MovePrevious();
+  EXPECT_TRUE(s.AtStart() && !s.AtEnd());
+  EXPECT_EQ(ErrorOf([&] { s.Field("AccountKey"); }), kErrNoCurrentRecord);
+  EXPECT_EQ(ErrorOf([&] { s.MovePrevious(); }), kErrNoCurrentRecord);
+  for (SnapshotKind kind : {SnapshotKind::Whole, SnapshotKind::Forward}) {
+    Snapshot none = db_->OpenSnapshot("SELECT AccountKey FROM tAccount WHERE 1 = 0", kind);
+    EXPECT_TRUE(none.AtStart() && none.AtEnd());
+    EXPECT_EQ(none.TotalRows() + none.RecordCount(), 0);
+    EXPECT_EQ(none.FieldCount(), 1);
+    EXPECT_EQ(ErrorOf([&] { none.MoveFirst(); }), kErrNoCurrentRecord);
+    EXPECT_EQ(ErrorOf([&] { none.MoveLast(); }), kErrNoCurrentRecord);
+  }
+}
+
+// A forward snapshot gives the rows in the statement's order, knows their number at once,
+// refuses to move back but reads them again from the first, and leaves nothing behind in the
+// database.
+TEST_F(SnapshotTest, ForwardSnapshotStreamsTheRowsAndCountsThemAtOpen) {
+  const char* sql = "SELECT AccountKey, City FROM tAccount ORDER BY AccountName DESC";
+  const char* spools = "SELECT count(*) FROM sqlite_temp_master WHERE type = 'table'";
+  Snapshot f = db_->OpenSnapshot(sql, SnapshotKind::Forward);
+  EXPECT_EQ(Column(*db_, spools), Texts{"1"});  // its rows wait in a temporary table
+  EXPECT_EQ(f.TotalRows(), 3);
+  f.MoveFirst();  // already there
+  db_->Close();   // the snapshot keeps the connection it reads through
+  Texts rows;
+  for (; !f.AtEnd(); f.MoveNext()) {
+    rows.push_back(std::get<std::string>(f.Field("AccountKey")));
+    if (IsNull(f.Field(1))) rows.back() += " without a city";
+    if (rows.size() == 2) {
+      EXPECT_EQ(ErrorOf([&] { f.MovePrevious(); }), kErrForwardOnly);
+      EXPECT_EQ(ErrorOf([&] { f.MoveLast(); }), kErrForwardOnly);
+    }
+  }
+  EXPECT_EQ(rows, (Texts{"3", "2 without a city", "1"}));
+  EXPECT_EQ(f.RecordCount(), 3);
+  EXPECT_EQ(ErrorOf([&] { f.MoveNext(); }), kErrNoCurrentRecord);
+  Texts reread;
+  for (f.MoveFirst(); !f.AtEnd(); f.MoveNext()) {
+    reread.push_back(std::get<std::string>(f.Field("AccountKey")));
+  }
+  EXPECT_EQ(reread, (Texts{"3", "2", "1"}));
+  db_.emplace(Database::Open(File("s.DB")));
+  db_->OpenSnapshot(sql, SnapshotKind::Forward).Close();
+  EXPECT_EQ(Column(*db_, spools), Texts{"0"});
+}
+
+// "(Select Distinct F From T)" reads the values kept as rows were appended; every way the
+// table's rows change must leave the answer what the rows themselves give.
+TEST_F(EngineTest, KeptDistinctValuesAnswerAsTheRowsDo) {
+  Database d = Database::Create(File("k.DB"), kLocale);
+  TableDef ledger("tLedger");
+  ledger.Field("Id", FieldType::Long)
+      .Field("AccountKey", FieldType::Text, 8)
+      .Field("Memo", FieldType::Text, 8)
+      .Index("PrimaryKey", {"Id", "AccountKey"}, true, true)
+      .KeepDistinct("AccountKey");
+  d.CreateTable(ledger);
+  d.CreateTable(AccountDef());
+  {
+    TableRecordset a = d.OpenTable("tAccount");
+    for (const char* key : {"1", "2", "3", "4", "א"}) AddAccount(a, key, "x");
+  }
+  const auto append = [&](std::vector<std::pair<int, std::string>> rows) {
+    TableRecordset t = d.OpenTable("tLedger");
+    for (const auto& [id, key] : rows) {
+      t.AddNew();
+      t.SetInt(0, id);
+      t.SetText(1, key);
+      ErrorOf([&] { t.Update(); });  // a repeated key is passed over
+    }
+  };
+  const auto members = [&](const std::string& in, const char* where = "") {
+    std::string keys;
+    Snapshot s = d.OpenSnapshot("SELECT AccountKey FROM tAccount WHERE AccountKey " + in +
+                                    " (Select Distinct AccountKey From tLedger" + where +
+                                    ") ORDER BY AccountKey",
+                                SnapshotKind::Forward);
+    for (; !s.AtEnd(); s.MoveNext()) keys += std::get<std::string>(s.Field(0));
+    return keys;
+  };
+  const auto sql = [&](const char* statement) {
+    sqlite3_stmt* st = nullptr;
+    sqlite3_prepare_v2(d.Handle(), statement, -1, &st, nullptr);
+    sqlite3_step(st);
+    const int n = sqlite3_column_int(st, 0);
+    sqlite3_finalize(st);
+    return n;
+  };
+  const char* kept = "SELECT count(*) FROM sqlite_master WHERE instr(name, '.distinct.') > 0";
+  EXPECT_EQ(members("In"), "");
+  append({{1, "1"}, {2, "1"}, {2, "א"}, {2, "א"}});
+  append({{3, "3"}, {4, "1"}});  // a second recordset adds to what is kept
+  EXPECT_EQ(members("In"), "13א");
+  EXPECT_EQ(members("Not In"), "24");
+  // The answer comes from the kept values, and only for the bare subquery.
+  sql("INSERT INTO \"tLedger.distinct.AccountKey\" VALUES ('4')");
+  EXPECT_EQ(members("In"), "134א");
+  EXPECT_EQ(members("In", " Where Id > 0"), "13א");
+  d.Execute("DELETE FROM tLedger WHERE AccountKey = \"3\"");
+  EXPECT_EQ(sql(kept), 0);  // a statement changed the rows: the table itself answers
+  EXPECT_EQ(members("In"), "1א");
+  append({{5, "2"}});
+  EXPECT_EQ(members("In"), "12א");
+  // Kept values come only from a text field of the primary key.
+  TableDef wrong("tWrong");
+  wrong.Field("Id", FieldType::Long).Field("K", FieldType::Text, 8).KeepDistinct("K");
+  EXPECT_EQ(ErrorOf([&] { d.CreateTable(wrong); }), kErrEngine);
+}
+
+TEST_F(SnapshotTest, FieldsAreFoundByTheirNameEvenQualified) {
+  Snapshot s = db_->OpenSnapshot(
+      "SELECT tAccount.AccountKey, tAccount.City, '' As Zip, 1000 As Reference1, Include, "
+      "CategoryCode FROM tAccount WHERE AccountKey = \"1\"");
+  EXPECT_EQ(s.FieldName(0), "AccountKey");
+  EXPECT_EQ(std::get<std::string>(s.Field("accountkey")), "1");
+  EXPECT_EQ(std::get<std::string>(s.Field("tAccount.City")), "חיפה");
+  EXPECT_EQ(std::get<int64_t>(s.Field("Reference1")), 1000);
+  EXPECT_EQ(std::get<int64_t>(s.Field("Include")), -1);
+  EXPECT_TRUE(IsNull(s.Field("CategoryCode")));
+  EXPECT_EQ(ErrorOf([&] { s.Field("Nope"); }), kErrNoSuchField);
+  EXPECT_EQ(ErrorOf([&] { s.Field(6); }), kErrNoSuchField);
+  const Outcome bad = Try([&] { db_->OpenSnapshot("SELECT Nope FROM tAccount"); });
+  EXPECT_EQ(bad.number, kErrSyntax);
+  EXPECT_NE(bad.description.find("Nope"), std::string::npos);
+  EXPECT_EQ(ErrorOf([&] { db_->OpenSnapshot("SELECT * FROM tMissing"); }), kErrNoSuchObject);
+}
+
+// Rows that statements write keep the field rules, whichever way the statement is sent and
+// while a recordset appends with its own checks; the file keeps them for other programs.
+TEST_F(SnapshotTest, StatementsThatWriteKeepTheFieldRules) {
+  db_->CreateTable(NumbersDef());
+  const std::pair<const char*, int> refused[] = {
+      {"UPDATE tAccount SET City = \"\"", kErrZeroLength},
+      {"UPDATE tAccount SET CategoryCode = \"אבגד\"", kErrFieldTooSmall},
+      {"UPDATE tAccount SET SortByKey = \"x\"", kErrDuplicateKey},
+      {"INSERT INTO tAccount (AccountKey, City) VALUES (\"9\", \"\")", kErrZeroLength},
+      {"INSERT INTO tAccount (AccountKey, CategoryCode) VALUES (\"9\", \"abcd\")",
+       kErrFieldTooSmall},
+      {"INSERT INTO tNumbers (B) VALUES (256)", kErrNumericOverflow},
+      {"INSERT INTO tNumbers (I) VALUES (-32769)", kErrNumericOverflow}};
+  for (bool appending : {false, true}) {
+    std::optional<TableRecordset> rs;
+    if (appending) rs.emplace(db_->OpenTable("tAccount"));
+    for (const auto& [sql, error] : refused) {
+      EXPECT_EQ(ErrorOf([&] { db_->Execute(sql); }), error) << sql;
+      EXPECT_EQ(ErrorOf([&] { db_->OpenSnapshot(sql); }), error) << sql;
+    }
+    if (!appending) {  // the failed statements left no row half-changed
+      EXPECT_EQ(Column(*db_, "SELECT SortByKey FROM tAccount ORDER BY AccountKey"),
+                (Texts{"1", "2", "3"}));
+    }
+    if (rs) {  // appends after the statements still refuse what they refused before
+      EXPECT_EQ(AddAccount(*rs, "4", ""), kErrZeroLength);
+      EXPECT_EQ(AddAccount(*rs, "5", "ו", "", "123456789012345678901"), kErrFieldTooSmall);
+      EXPECT_EQ(AddAccount(*rs, "4", "דלת"), 0);
+    }
+  }
+  EXPECT_EQ(db_->Execute("UPDATE tAccount SET Include = False WHERE City Is Null"), 2);
+  EXPECT_EQ(Column(*db_, "SELECT AccountKey FROM tAccount WHERE Include = False"),
+            (Texts{"2", "4"}));
+  EXPECT_EQ(db_->Execute("INSERT INTO tNumbers (B, I, Code) VALUES (255, -32768, \"abc\")"), 1);
+  db_->Close();
+  sqlite3* raw = nullptr;
+  ASSERT_EQ(sqlite3_open(File("s.DB").c_str(), &raw), SQLITE_OK);
+  RegisterHebrewCollation(raw);
+  EXPECT_EQ(sqlite3_exec(raw, "UPDATE tAccount SET City = ''", nullptr, nullptr, nullptr),
+            SQLITE_CONSTRAINT);
+  EXPECT_EQ(sqlite3_extended_errcode(raw), SQLITE_CONSTRAINT_CHECK);
+  sqlite3_close(raw);
+}
+
+// ---------------------------------------------------------------------------------------
+// Links (read through in test_statements)
+
+TEST_F(EngineTest, LinkToAMissingFileFailsAtOnceAndAtUse) {
+  Database work = Database::Create(File("zdrlab.DB"), kLocale);
+  EXPECT_EQ(ErrorOf([&] { work.LinkTable("tSelectAccount", File("none.DB"), "tSelectAccount"); }),
+            kErrCannotOpen);
+  EXPECT_FALSE(fs::exists(File("none.DB")));  // never created by the attempt
+  EXPECT_FALSE(work.HasTable("tSelectAccount"));
+  const fs::path selectDb = File("zdracc.DB");
+  Database::Create(selectDb, kLocale, Durability::Durable)
+      .CreateTable(TableDef("tSelectAccount").Field("SortByKey", FieldType::Text, 20));
+  EXPECT_EQ(ErrorOf([&] { work.LinkTable("tOther", selectDb, "tNoSuch"); }), kErrNoSuchObject);
+  work.LinkTable("tSelectAccount", selectDb, "tSelectAccount");
+  work.Close();
+  fs::remove(selectDb);
+  Database again = Database::Open(File("zdrlab.DB"));  // opens despite the missing file
+  EXPECT_TRUE(again.HasTable("tSelectAccount"));
+  const Outcome use = Try([&] { again.OpenSnapshot("SELECT * FROM tSelectAccount"); });
+  EXPECT_EQ(use.number, kErrCannotOpen);
+  EXPECT_NE(use.description.find("zdracc.DB"), std::string::npos);
+}
+
+// ---------------------------------------------------------------------------------------
+// Hebrew collation and LIKE
+
+class CollationTest : public EngineTest {
+ protected:
+  // A table of names (unique), each with a city but the first.
+  Database& Fill(const Texts& names) {
+    db_.emplace(Database::Create(File("c" + std::to_string(++files_) + ".DB"), kLocale));
+    db_->CreateTable(TableDef("tName")
+                         .Field("Name", FieldType::Text, 50)
+                         .Field("City", FieldType::Text, 50)
+                         .Index("Name", {"Name"}, false, true));
+    TableRecordset rs = db_->OpenTable("tName");
+    for (const std::string& n : names) {
+      rs.AddNew();
+      rs.SetText(0, n);
+      if (n != names.front()) rs.SetText(1, n);
+      rs.Update();
+    }
+    return *db_;
+  }
+  Texts Names(const std::string& where = "", const char* order = "ASC") {
+    return Column(*db_, "SELECT Name FROM tName " + where + " ORDER BY Name " + order);
+  }
+  std::optional<Database> db_;
+  int files_ = 0;
+};
+
+TEST_F(CollationTest, DictionaryOrderWithFinalLettersBesideTheirBaseAndLatinAfterHebrew) {
+  const std::pair<Texts, Texts> cases[] = {
+      // By code point ך comes before כ; in the dictionary they are one letter.
+      {{"אבל", "אבךב", "אבכא", "ת", "אבך", "אבכ", "ב"},
+       {"אבכ", "אבך", "אבכא", "אבךב", "אבל", "ב", "ת"}},
+      {{"תל אביב", "Haifa", "אילת", "haifa", "Akko", "12", "באר שבע"},
+       {"12", "אילת", "באר שבע", "תל אביב", "Akko", "haifa", "Haifa"}}};
+  for (const auto& [names, order] : cases) {
+    Fill(names);
+    EXPECT_EQ(Names(), order);
+    EXPECT_EQ(Names("", "DESC"), Texts(order.rbegin(), order.rend()));
+  }
+}
+
+TEST_F(CollationTest, TextsTheCollatorRanksEqualAreNeverMerged) {
+  const std::string composed = "Caf\xc3\xa9";     // é as one code point
+  const std::string decomposed = "Cafe\xcc\x81";  // e and a combining acute
+  ASSERT_NE(CompareHebrew(composed, decomposed), 0);
+  Database& db = Fill({composed, decomposed});  // both pass the unique index
+  EXPECT_EQ(Column(db, "SELECT DISTINCT Name FROM tName").size(), 2u);
+  EXPECT_EQ(Count(db, "tName WHERE Name = \"" + composed + "\""), "1");
+  EXPECT_LT(CompareHebrew("כהן", "לוי"), 0);
+  EXPECT_GT(CompareHebrew("לוי", "כהן"), 0);
+  EXPECT_LT(CompareHebrew("", "א"), 0);
+  // Bytes that are not UTF-8 still compare, consistently.
+  const int ab = CompareHebrew("\xff\x01", "\xff\x02");
+  EXPECT_NE(ab, 0);
+  EXPECT_EQ(CompareHebrew("\xff\x02", "\xff\x01"), -ab);
+}
+
+// Texts of printable ASCII alone are ordered without ICU; the order must be ICU's to the pair,
+// also next to the bytes just outside that range (0x1F and DEL), which go to ICU.
+TEST(AsciiShortcutTest, AgreesWithIcuOnEveryPairOfShortTexts) {
+  ASSERT_TRUE(HasAsciiShortcut());
+  // Every text of up to three such characters. Both orders are total (bytes break the
+  // collator's ties), so if neighbours in one's sorted order are in the other's order too,
+  // the two agree on every pair: 900,000 texts checked in full without 10^11 comparisons.
+  Texts texts(1);
+  std::string chars;
+  for (int c = 0x1F; c <= 0x7F; ++c) chars += static_cast<char>(c);
+  for (char a : chars) {
+    texts.emplace_back(1, a);
+    for (char b : chars) {
+      texts.push_back({a, b});
+      for (char c : chars) texts.push_back({a, b, c});
+    }
+  }
+  std::sort(texts.begin(), texts.end(),
+            [](const std::string& x, const std::string& y) { return CompareHebrew(x, y) < 0; });
+  for (size_t i = 1; i < texts.size(); ++i) {
+    ASSERT_LT(CompareHebrewWithIcu(texts[i - 1], texts[i]), 0) << texts[i - 1] << "|" << texts[i];
+  }
+}
+
+// Jet's wildcards, `%` taken literally, no row for a Null, and no ESCAPE.
+TEST_F(CollationTest, LikeInStatementsIsJetsLike) {
+  Fill({"100% כותנה", "1000 כותנה", "a_b", "axb", "תל אביב"});
+  const std::pair<const char*, Texts> cases[] = {
+      {"Name LIKE \"100%*\"", {"100% כותנה"}},
+      {"Name LIKE \"a_b\"", {"a_b"}},
+      {"Name LIKE \"A?B\"", {"a_b", "axb"}},
+      {"Name LIKE \"תל*\"", {"תל אביב"}},
+      {"Name NOT LIKE \"*כותנה\"", {"תל אביב", "a_b", "axb"}},
+      {"City LIKE \"*\"", {"1000 כותנה", "תל אביב", "a_b", "axb"}}};
+  for (const auto& [where, names] : cases)
+    EXPECT_EQ(Names(std::string("WHERE ") + where), names) << where;
+  sqlite3_stmt* st = nullptr;
+  ASSERT_EQ(sqlite3_prepare_v2(db_->Handle(), "SELECT 'a' LIKE 'a' ESCAPE '!'", -1, &st, nullptr),
+            SQLITE_OK);
+  EXPECT_EQ(sqlite3_step(st), SQLITE_ERROR);
+  sqlite3_finalize(st);
+}
+
+}  // namespace
+}  // namespace zdr::db
