@@ -278,7 +278,7 @@ TEST(ReusedBuffers, GiveTheSameBytesAsTheReturningForms) {
   EXPECT_EQ(buffer, "");
 }
 
-TEST(SmallHelpers, CutTrimAndHostLetter) {
+TEST(SmallHelpers, CutTrimHostLetterAndAlignRight) {
   EXPECT_EQ(CutAtNull("AB\0C"s), "AB");
   EXPECT_EQ(CutAtNull("\0AB"s), "");
   EXPECT_EQ(CutAtNull("ABC"), "ABC");
@@ -291,6 +291,11 @@ TEST(SmallHelpers, CutTrimAndHostLetter) {
   };
   for (const auto& [text, host] : letters) EXPECT_EQ(ToHostLetter(text), host) << text;
   EXPECT_THROW(ToHostLetter(""), HostTextError);
+  EXPECT_EQ(AlignRight(std::string_view("5"), 3), "  5");
+  EXPECT_EQ(AlignRight(std::nullopt, 3), "   ");
+  EXPECT_EQ(AlignRight(std::string_view("123"), 3), "123");
+  EXPECT_THROW(AlignRight(std::string_view("1234"), 3), HostTextError);
+  EXPECT_THROW(AlignRight(std::nullopt, -1), HostTextError);
 }
 
 TEST(ExtractHebrewWords, KeepsHebrewWordsAtTheReadingStart) {
@@ -320,15 +325,6 @@ TEST(ExtractHebrewWords, KeepsHebrewWordsAtTheReadingStart) {
   for (const Case& c : cases) {
     EXPECT_EQ(ExtractHebrewWords(c.field, c.n), c.words) << U8(c.field) << " n=" << c.n;
   }
-}
-
-TEST(AlignRight, PadsOnTheLeftOrThrows) {
-  EXPECT_EQ(AlignRight(std::string_view("5"), 3), "  5");
-  EXPECT_EQ(AlignRight(std::nullopt, 3), "   ");
-  EXPECT_EQ(AlignRight(std::string_view("123"), 3), "123");
-  EXPECT_EQ(AlignRight(std::nullopt, 0), "");
-  EXPECT_THROW(AlignRight(std::string_view("1234"), 3), HostTextError);
-  EXPECT_THROW(AlignRight(std::nullopt, -1), HostTextError);
 }
 
 }  // namespace

@@ -132,46 +132,17 @@ TEST_F(DataLoad, AsIsReachesTheAccountImportAndCutOffBoxIsWrittenBack) {
   EXPECT_EQ(Query("SELECT AccountKey FROM tAccount ORDER BY SortByKeyVal"), (Strings{"12", "34"}));
 }
 
-// A generated company of ordinary size, loaded as the dispatch load does (not as-is): every
-// live account with a key of its own becomes one row, and every distinct account of a
-// ledger transaction or batch one tTransact row. The keys of the ledger, the batches and the
-// cash receipts are converted as the account keys: were they converted otherwise, digit
-// keys would miss their accounts and the payers would drop out of the dispatch file.
-TEST_F(DataLoad, GeneratedCompanyRowsMatchAndDispatchLoadLostPayersWhoseKeysConvertDifferently) {
-  const zdrgen::CompanyTruth truth =
-      zdrgen::WriteCompany(root_ / "generated", zdrgen::Options(), "חברה לדוגמה");
-  state_.companyPath = truth.folder.string();
-  const std::set<std::string> stored = [&] {
-    panel_.chkTransType = 1;
-    panel_.txtTransType = "*";
-    panel_.chkReadTempTrans = 1;
-    Load(false);
-    const Strings keys = Query("SELECT AccountKey FROM tAccount");
-    return std::set<std::string>(keys.begin(), keys.end());
-  }();
-  EXPECT_TRUE(seam_.messages.empty()) << seam_.messages[0].text;
-  int64_t accounts = 0, transacts = 0;
-  for (const auto& a : truth.accounts) {
-    if (a.deleted || a.duplicateKey) continue;
-    ++accounts;
-    if (a.unambiguousKey) {
-      EXPECT_TRUE(stored.count(a.key)) << a.key;
-    }
-  }
-  EXPECT_EQ(static_cast<int64_t>(stored.size()), accounts);
-  auto distinctKeys = [&](const zdrgen::LedgerTruth& t) {
-    std::set<std::string> keys;
-    for (int idx : t.accountIndex) {
-      if (idx >= 0) keys.insert(truth.accounts[static_cast<size_t>(idx)].key);
-    }
-    return static_cast<int64_t>(keys.size());
-  };
-  for (const auto& t : truth.ledger) transacts += distinctKeys(t);
-  for (const auto& b : truth.batches) {
-    for (const auto& t : b.transactions) transacts += b.number == 0 ? 0 : distinctKeys(t);
-  }
-  EXPECT_EQ(Count(state_.workDbPath, "tTransact"), transacts);
-
+// A generated company loaded as the dispatch load does (not as-is). The keys of the ledger,
+// the batches and the cash receipts are converted as the account keys: were they converted
+// otherwise, digit keys would miss their accounts and the payers would drop out of the
+// dispatch file.
+TEST_F(DataLoad, DispatchLoadLostPayersWhoseKeysConvertDifferently) {
+  state_.companyPath =
+      zdrgen::WriteCompany(root_ / "generated", zdrgen::Options(), "חברה לדוגמה").folder.string();
+  panel_.chkTransType = 1;
+  panel_.txtTransType = "*";
+  panel_.chkReadTempTrans = 1;
+  Load(false);
   for (const char* table : {"tTransact", "tCash"}) {
     SCOPED_TRACE(table);
     if (std::string(table) == "tCash") {

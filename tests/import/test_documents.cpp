@@ -200,24 +200,30 @@ TEST_F(DocumentImport, MissingAndCutFiles) {
   EXPECT_EQ(Count(db_, "tStockLine"), 3);
 }
 
-// ---- Items and the marking.
-
-class ItemImport : public DocumentImport {
- protected:
-  void SetUp() override {
-    DocumentImport::SetUp();
-    // Headers 1 (items A1, B2), 5 (C3), 8 (Z9 only), 11 (A1 twice).
-    Write("IMV.FIX", Join({Doc(1, {{"A1", 1}, {"B2", 1}}), Doc(1, {{"C3", 1}}), Doc(1, {{"Z9", 1}}),
-                           Doc(1, {{"A1", 1}, {"A1", 1}})}));
-  }
-  void Items(const std::vector<std::pair<std::string, std::string>>& items) {
+// Items in range mark their documents (a sort bound trimmed and padded, keys compared as
+// text); a sort bound too long, or no ITM.fix, is a fault that leaves every document marked.
+TEST_F(DocumentImport, ItemsInRangeMarkTheirDocuments) {
+  // Headers 1 (items A1, B2), 5 (C3), 8 (Z9 only), 11 (A1 twice).
+  Write("IMV.FIX", Join({Doc(1, {{"A1", 1}, {"B2", 1}}), Doc(1, {{"C3", 1}}), Doc(1, {{"Z9", 1}}),
+                         Doc(1, {{"A1", 1}, {"A1", 1}})}));
+  using Items = std::vector<std::pair<std::string, std::string>>;
+  const std::tuple<Items, std::function<void(Panel&)>, const char*> cases[] = {
+      // clang-format off
+      {{{"A1", "  1"}, {"B2", "  2"}, {"", "  3"}, {"C3", "  4"}, {"A1", "  5"}}, [](Panel&) {}, "A1 B2 C3 / 1 5 11"},
+      {{{"A1", "  9"}, {"C3", "  5"}}, [](Panel& p) { p.txtFromItmSort = " 7 "; }, "A1 / 1 11"},
+      {{{"A20", "  1"}, {"A1", "  1"}, {"C3", "  1"}}, [](Panel& p) { p.txtFromItmKey = "A100", p.txtToItmKey = "B"; }, "A20 /"},
+      {{{"A1", "  1"}}, [](Panel& p) { p.txtToItmSort = "1234"; }, "/ 1 5 8 11"},
+      {{}, [](Panel&) {}, "/ 1 5 8 11"},
+      // clang-format on
+  };
+  for (const auto& [items, set, marked] : cases) {
     Records recs{zdrgen::ItemRecord({"FIRST", "", "  1"})};
     for (const auto& [key, sort] : items) recs.push_back(zdrgen::ItemRecord({key, "", sort}));
     recs.push_back(zdrgen::ItemRecord({"LAST", "", "  1"}));
     Write("ITM.fix", recs);
-  }
-  // "items / marked headers" after the item import.
-  std::string Read() {
+    if (items.empty()) std::filesystem::remove(std::filesystem::path(company_) / "ITM.fix");
+    panel_ = Panel{};
+    set(panel_);
     db_.clear();
     Run();
     ReadItem(company_, db_, panel_, seam_);
@@ -228,33 +234,8 @@ class ItemImport : public DocumentImport {
          Rows(db_, "SELECT HeadIndx FROM tStockHead WHERE Include ORDER BY HeadIndx")) {
       out += " " + h;
     }
-    return out;
+    EXPECT_EQ(out, marked);
   }
-};
-
-TEST_F(ItemImport, ItemsInRangeMarkTheirDocuments) {
-  Items({{"A1", "  1"}, {"B2", "  2"}, {"", "  3"}, {"C3", "  4"}, {"A1", "  5"}});
-  EXPECT_EQ(Read(), "A1 B2 C3 / 1 5 11");
-  EXPECT_TRUE(seam_.messages.empty());
-  // A sort bound is trimmed and padded.
-  Items({{"A1", "  9"}, {"C3", "  5"}});
-  panel_.txtFromItmSort = " 7 ";
-  EXPECT_EQ(Read(), "A1 / 1 11");
-  // Keys are compared as text.
-  Items({{"A20", "  1"}, {"A1", "  1"}, {"C3", "  1"}});
-  panel_ = Panel{};
-  panel_.txtFromItmKey = "A100";
-  panel_.txtToItmKey = "B";
-  EXPECT_EQ(Read(), "A20 /");
-}
-
-TEST_F(ItemImport, TooLongSortBoundOrMissingFileIsFaultAndLeavesMarks) {
-  panel_.txtToItmSort = "1234";
-  Items({{"A1", "  1"}});
-  EXPECT_EQ(Read(), "/ 1 5 8 11");
-  std::filesystem::remove(std::filesystem::path(company_) / "ITM.fix");
-  panel_ = Panel{};
-  EXPECT_EQ(Read(), "/ 1 5 8 11");
   ASSERT_EQ(seam_.messages.size(), 2u);
   for (const auto& m : seam_.messages) {
     EXPECT_EQ(m.title, "תקלה");
