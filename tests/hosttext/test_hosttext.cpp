@@ -63,35 +63,26 @@ TEST(FieldConversions, GiveTheirBytes) {
   const auto Display = [](std::string_view s) { return ConvertForDisplay(s, false); };
   const auto DisplayAsIs = [](std::string_view s) { return ConvertForDisplay(s, true); };
   const ConversionCase cases[] = {
-      {"reverse", reverse, "\x82\x81\x80", "\xE0\xE1\xE2"},
-      {"reverse", reverse, "(12)", "(21)"},
-      {"reverse", reverse, Host("[ןהכ] <1"), W("1> [כהן]")},
-      {"reverse", reverse, "\x00\x9B\xFF\x80"s, "\xE0\xFF\x9B\x00"s},
-      {"reverse", reverse, "", ""},
-      {"hebrew first", hebrewFirst, "12 \x82\x81\x80", "\xE0\xE1\xE2 12"},
+      // clang-format off
+      {"reverse", reverse, "\x82\x81\x80", "\xE0\xE1\xE2"}, {"reverse", reverse, "(12)", "(21)"},
+      {"reverse", reverse, Host("[ןהכ] <1"), W("1> [כהן]")}, {"reverse", reverse, "\x00\x9B\xFF\x80"s, "\xE0\xFF\x9B\x00"s},
+      {"reverse", reverse, "", ""}, {"hebrew first", hebrewFirst, "12 \x82\x81\x80", "\xE0\xE1\xE2 12"},
       {"hebrew first", hebrewFirst, "(12)", "12"},
       // Quotes and brackets vanish wherever they stand; other punctuation follows its side.
-      {"hebrew first", hebrewFirst, Host("מ\"עב ABC-1"), W("בעמ ABC-1")},
-      {"display", Display, "  12 \x82\x81\x80  ", "\xE0\xE1\xE2 12"},
-      {"display", Display, "", ""},
-      {"display as is", DisplayAsIs, "  (12)  ", "(21)"},
-      {"display as is", DisplayAsIs, "     ", ""},
-      {"sort", sort, "12 \x82\x81\x80", "12\xE0\xE1\xE2 "},
-      {"sort", sort, "AB\"C", "AB'C"},
-      {"sort", sort, "03-1234567", "03-1234567"},
+      {"hebrew first", hebrewFirst, Host("מ\"עב ABC-1"), W("בעמ ABC-1")}, {"display", Display, "  12 \x82\x81\x80  ", "\xE0\xE1\xE2 12"},
+      {"display", Display, "", ""}, {"display as is", DisplayAsIs, "  (12)  ", "(21)"},
+      {"display as is", DisplayAsIs, "     ", ""}, {"sort", sort, "12 \x82\x81\x80", "12\xE0\xE1\xE2 "},
+      {"sort", sort, "AB\"C", "AB'C"}, {"sort", sort, "03-1234567", "03-1234567"},
       {"sort", sort, "AB  ", "AB  "},  // not trimmed
       {"sort", sort, "\x9B\x80\x00"s, "\x00\xE0\x9B"s},
       // Read from the end the digits come first, so the "-" inside the Hebrew is dropped;
       // with the Hebrew first it keeps its "-" and the space after it.
-      {"sort", sort, Host("בא-ג 12"), W(" 12גאב")},
-      {"sort", sort, Host("12 בא-ג"), W("12ג-אב ")},
-      {"sort", sort, "", ""},
-      {"spaced", spaced, "12 \x82\x81\x80", "12 \xE0\xE1\xE2 "},
-      {"spaced", spaced, "03-1234567", "03-1234567 "},
-      {"spaced", spaced, "AB\"C", "AB\"C "},
-      {"spaced", spaced, "   ", "   "},
-      {"spaced", spaced, Host("בא-ג 12"), W(" 12 ג אב")},
+      {"sort", sort, Host("בא-ג 12"), W(" 12גאב")}, {"sort", sort, Host("12 בא-ג"), W("12ג-אב ")},
+      {"sort", sort, "", ""}, {"spaced", spaced, "12 \x82\x81\x80", "12 \xE0\xE1\xE2 "},
+      {"spaced", spaced, "03-1234567", "03-1234567 "}, {"spaced", spaced, "AB\"C", "AB\"C "},
+      {"spaced", spaced, "   ", "   "}, {"spaced", spaced, Host("בא-ג 12"), W(" 12 ג אב")},
       {"spaced", spaced, "", ""},
+      // clang-format on
   };
   for (const ConversionCase& c : cases) {
     EXPECT_EQ(c.convert(c.field), c.result) << c.what << ": " << U8(c.field);
@@ -305,22 +296,20 @@ TEST(ExtractHebrewWords, KeepsHebrewWordsAtTheReadingStart) {
     std::string words;
   };
   const Case cases[] = {
+      // clang-format off
       {Host("ןהכ השמ"), 20, Host("ןהכ השמ")},
       // Digits inside words vanish; so does punctuation other than space, "-" and ".".
-      {Host("ה2ש1מ"), 20, Host("השמ")},
-      {Host("ןה,כ-ה\"שמ"), 20, Host("ןהכ-השמ")},
+      {Host("ה2ש1מ"), 20, Host("השמ")}, {Host("ןה,כ-ה\"שמ"), 20, Host("ןהכ-השמ")},
       // Padding after the field's reading start is skipped; padding at its end is kept.
-      {Host("השמ   "), 20, Host("השמ")},
-      {Host("   השמ"), 20, Host("   השמ")},
+      {Host("השמ   "), 20, Host("השמ")}, {Host("   השמ"), 20, Host("   השמ")},
       // It stops at an ASCII letter.
-      {Host("השמ X"), 20, ""},
-      {Host("X השמ"), 20, Host(" השמ")},
+      {Host("השמ X"), 20, ""}, {Host("X השמ"), 20, Host(" השמ")},
       {Host("ד ג ב א"), 3, Host("ב א")},
       // Seven words fit the word limit, but only the last 20 bytes of them are kept.
       {Host("זזזזז ווווו ההההה דדדדד גגגגג בבבבב אאאאא"), 20, Host("דד גגגגג בבבבב אאאאא")},
-      {"      ", 20, ""},
-      {Host("השמ"), 0, ""},
+      {"      ", 20, ""}, {Host("השמ"), 0, ""},
       {Host("השמ"), -1, ""},
+      // clang-format on
   };
   for (const Case& c : cases) {
     EXPECT_EQ(ExtractHebrewWords(c.field, c.n), c.words) << U8(c.field) << " n=" << c.n;

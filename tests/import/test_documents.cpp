@@ -71,15 +71,10 @@ class DocumentImport : public test::ImportTest {
 // the table refused used to end the whole document import.
 TEST_F(DocumentImport, HeaderAndLineValues) {
   using test::HostText;
-  const zdrgen::DocHeaderFields h{1,
-                                  1,
-                                  "AB(1",
-                                  HostText("משה כהן", 30),
-                                  HostText("הרצל 5", 30),
-                                  HostText("חיפה", 30),
-                                  "00042",
-                                  HostText("לכבוד", 48),
-                                  1};
+  // clang-format off
+  const zdrgen::DocHeaderFields h{1, 1, "AB(1", HostText("משה כהן", 30), HostText("הרצל 5", 30),
+                                  HostText("חיפה", 30), "00042", HostText("לכבוד", 48), 1};
+  // clang-format on
   const zdrgen::DocHeaderFields blank{1, 1, "", "", "", "", "", "", 1};
   const zdrgen::DocHeaderFields quotes{1, 1, "", "\"\"", "", "()", "", "\"()\"", 1};
   Records recs;
