@@ -196,7 +196,8 @@ TEST_F(DocumentImport, MissingAndCutFiles) {
 }
 
 // Items in range mark their documents (a sort bound trimmed and padded, keys compared as
-// text); a sort bound too long, or no ITM.fix, is a fault that leaves every document marked.
+// text, both bounds kept); a sort bound too long, or no ITM.fix, is a fault that leaves every
+// document marked.
 TEST_F(DocumentImport, ItemsInRangeMarkTheirDocuments) {
   // Headers 1 (items A1, B2), 5 (C3), 8 (Z9 only), 11 (A1 twice).
   Write("IMV.FIX", Join({Doc(1, {{"A1", 1}, {"B2", 1}}), Doc(1, {{"C3", 1}}), Doc(1, {{"Z9", 1}}),
@@ -206,7 +207,8 @@ TEST_F(DocumentImport, ItemsInRangeMarkTheirDocuments) {
       // clang-format off
       {{{"A1", "  1"}, {"B2", "  2"}, {"", "  3"}, {"C3", "  4"}, {"A1", "  5"}}, [](Panel&) {}, "A1 B2 C3 / 1 5 11"},
       {{{"A1", "  9"}, {"C3", "  5"}}, [](Panel& p) { p.txtFromItmSort = " 7 "; }, "A1 / 1 11"},
-      {{{"A20", "  1"}, {"A1", "  1"}, {"C3", "  1"}}, [](Panel& p) { p.txtFromItmKey = "A100", p.txtToItmKey = "B"; }, "A20 /"},
+      {{{"A20", "  1"}, {"A1", "  1"}, {"A100", "  1"}, {"B", "  1"}, {"C3", "  1"}},
+       [](Panel& p) { p.txtFromItmKey = "A100", p.txtToItmKey = "B"; }, "A100 A20 B /"},
       {{{"A1", "  1"}}, [](Panel& p) { p.txtToItmSort = "1234"; }, "/ 1 5 8 11"},
       {{}, [](Panel&) {}, "/ 1 5 8 11"},
       // clang-format on
