@@ -4,18 +4,12 @@
 
 namespace zdr::test {
 
-// The column lists: names and addresses from the account card, or from the document header.
+// The column list with names and addresses from the account card.
 inline constexpr const char* kAccountColumns =
     "SELECT Distinct tAccount.CategoryCode, tAccount.AccountKey, tAccount.AccountName, "
     "tAccount.Address, tAccount.City, tAccount.Zip, 1000 As Reference1, '0' As DetailsLine1, "
     "tAccount.District, tAccount.Details, tAccount.Telephone, tAccount.SortByKey, "
     "tAccount.SortByKeyVal, tAccount.SortByName, tAccount.SortByCity, tAccount.SortByZip";
-inline constexpr const char* kDocumentColumns =
-    "SELECT Distinct tAccount.CategoryCode, tAccount.AccountKey, tStockHead.CustomerName As "
-    "AccountName, tStockHead.Address1 As Address, tStockHead.Address2 As City, '' As Zip, "
-    "tStockHead.Reference1, tStockHead.DetailsLine1, tAccount.District, tAccount.Details, "
-    "tAccount.Telephone, tAccount.SortByKey, tAccount.SortByKeyVal, tStockHead.SortByName, "
-    "tStockHead.SortByCity, tStockHead.SortByZip";
 
 // The WHERE clause with no criterion, and each criterion it may gain.
 inline constexpr const char* kWhere = " Where (1 > 0)";
