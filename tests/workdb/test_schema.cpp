@@ -42,9 +42,14 @@ void ExpectAsDefined(db::Database& d, const db::TableDef& def) {
   }
 }
 
+// Leftovers of an earlier run are replaced without a question.
 TEST_F(SchemaTest, BothDatabasesHoldTheirTablesTheLinkAndTheStoredQuery) {
+  std::ofstream(dir_ / "zdrlab.DB", std::ios::binary) << "not a database at all";
   const std::string select = CreateSelectDB(ui_);
   ASSERT_EQ(select, (dir_ / "zdracc.DB").string());
+  db::Database::Open(select).Execute("INSERT INTO tSelectAccount (AccountKey) VALUES ('1')");
+  ASSERT_EQ(CreateSelectDB(ui_), select);
+  EXPECT_TRUE(db::Database::Open(select).OpenSnapshot("SELECT * FROM tSelectAccount").AtEnd());
   const std::string path = CreateWorkDB(select, ui_);
   ASSERT_EQ(path, (dir_ / "zdrlab.DB").string());
   db::Database work = db::Database::Open(path);
@@ -60,17 +65,6 @@ TEST_F(SchemaTest, BothDatabasesHoldTheirTablesTheLinkAndTheStoredQuery) {
   EXPECT_TRUE(db::Database::Open(select).QueryNames().empty());
   EXPECT_TRUE(ui_.messages.empty());
   EXPECT_FALSE(db::Database::Open(CreateWorkDB("", ui_)).HasTable("tSelectAccount"));
-}
-
-TEST_F(SchemaTest, LeftoversAreReplacedWithoutAQuestion) {
-  std::ofstream(dir_ / "zdrlab.DB", std::ios::binary) << "not a database at all";
-  const std::string path = CreateSelectDB(ui_);
-  db::Database::Open(path).Execute(
-      "INSERT INTO tSelectAccount (AccountKey, SortByKey) VALUES ('1', '1')");
-  ASSERT_EQ(CreateSelectDB(ui_), path);
-  EXPECT_TRUE(db::Database::Open(path).OpenSnapshot("SELECT * FROM tSelectAccount").AtEnd());
-  EXPECT_TRUE(db::Database::Open(CreateWorkDB("", ui_)).HasTable("tAccount"));
-  EXPECT_TRUE(ui_.messages.empty());
 }
 
 // The temporary folder is the Temp variable, else the system's; when neither serves, or the
@@ -105,7 +99,7 @@ TEST_F(SchemaTest, EveryFailureIsShownAsAFaultAndNothingReturned) {
     EXPECT_EQ(ui.messages[0].icon, MsgIcon::Critical);
     EXPECT_FALSE(ui.messages[0].text.empty());
   }
-  EXPECT_FALSE(fs::exists(dir_ / "missing"));
+  EXPECT_FALSE(fs::exists(dir_ / "missing") || fs::exists(dir_ / "gone.DB"));
   EXPECT_TRUE(fs::is_directory(dir_ / "zdrlab.DB"));
   EXPECT_FALSE(fs::exists("/zdrlab.DB"));
 }
