@@ -14,9 +14,8 @@ namespace {
 TEST(TranslateTest, StatementsReadAsMeant) {
   const std::pair<std::string, const char*> cases[] = {
       // Literals: one quoting for SQLite, and nothing inside a literal rewritten.
-      {"SELECT * FROM t WHERE City LIKE \"חי*\"", "SELECT * FROM t WHERE City LIKE 'חי*'"},
-      {"SELECT \"it's\", \"say \"\"hi\"\"\", 'ג''ון', \"\"",
-       "SELECT 'it''s', 'say \"hi\"', 'ג''ון', ''"},
+      {"SELECT \"it's\", \"say \"\"hi\"\"\", 'ג''ון', \"\" FROM t WHERE c LIKE \"חי*\"",
+       "SELECT 'it''s', 'say \"hi\"', 'ג''ון', '' FROM t WHERE c LIKE 'חי*'"},
       {"SELECT 'True', \"False\", 'Select * From x', 'Error', 'DISTINCTROW; DROP TABLE x' FROM t",
        "SELECT 'True', 'False', 'Select * From x', 'Error', 'DISTINCTROW; DROP TABLE x' FROM t"},
       // Yes/no constants, except as a field name.
@@ -47,8 +46,7 @@ TEST(TranslateTest, StatementsReadAsMeant) {
        "SET tAccount.AccountName = S.SortByName, tAccount.Include = True WHERE S.Include",
        "UPDATE tAccount SET AccountName = (SELECT S.SortByName FROM tSelectAccount AS S WHERE "
        "(tAccount.AccountKey = S.AccountKey) AND (S.Include)), Include = -1 WHERE EXISTS (SELECT 1 "
-       "FROM "
-       "tSelectAccount AS S WHERE (tAccount.AccountKey = S.AccountKey) AND (S.Include))"},
+       "FROM tSelectAccount AS S WHERE (tAccount.AccountKey = S.AccountKey) AND (S.Include))"},
       {"DELETE tItem.* FROM tItem WHERE ItemKey = \"A\"", "DELETE FROM tItem WHERE ItemKey = 'A'"},
   };
   for (const auto& [jet, sql] : cases) EXPECT_EQ(TranslateJetSql(jet), sql) << jet;
