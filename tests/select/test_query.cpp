@@ -38,8 +38,6 @@ TEST(CriteriaTest, EachCriterionInItsFixedPlace) {
        kPicked},
       {"not picked", [](Panel& p) { p.ChkSelectAccount = 1, p.cmbInAccounts = 1; }, false, false,
        true, kNotPicked},
-      {"issued receipts", [](Panel& p) { p.cmbDocType = kCashReceiptsRow; }, true, false, false,
-       kCashIn},
       {"empty row", [](Panel& p) { p.cmbDocType = 41; }, true, false, false, kCashIn},
       {"row not looked up", [](Panel& p) { p.cmbDocType = 42; }, false, true, false, kNotIssued},
       {"row out of range", [](Panel& p) { p.cmbDocType = -1; }, true, false, false, "Error"},
