@@ -39,13 +39,6 @@ struct HeadRow {
   Text customerName, address1, address2, detailsLine1;
 };
 
-// Joins lines with CR LF after each.
-inline std::string Lines(const std::vector<std::string>& lines) {
-  std::string out;
-  for (const auto& l : lines) out += l + "\r\n";
-  return out;
-}
-
 // A file of tests/data/output as the outputs write it: its lines end in CR LF, its text is
 // Windows-1255 (the file itself is UTF-8 with LF line ends, to read and to diff).
 inline std::string Golden(const std::string& name) {
@@ -87,64 +80,51 @@ class OutputTest : public ::testing::Test {
     panel.CmbSortDir = 0;
   }
 
-  // A new working database holding `accounts` (sorted in the given order) and `heads`.
+  // A new working database holding `accounts` (sorted in the given order) and `heads`, an
+  // empty text left Null as the importers leave it.
   std::string BuildDb(const std::vector<AccountRow>& accounts,
                       const std::vector<HeadRow>& heads = {}) {
     RecordingSeam createSeam;
     const std::string path = CreateWorkDB("", createSeam);
     EXPECT_FALSE(path.empty()) << (createSeam.messages.empty() ? "" : createSeam.messages[0].text);
     db::Database database = db::Database::Open(path);
-    {
-      db::TableRecordset t = database.OpenTable("tAccount");
-      const int key = t.FieldIndex("AccountKey"), sortKey = t.FieldIndex("SortByKey"),
-                sortVal = t.FieldIndex("SortByKeyVal"), sortName = t.FieldIndex("SortByName");
-      const int name = t.FieldIndex("AccountName"), address = t.FieldIndex("Address"),
-                city = t.FieldIndex("City"), zip = t.FieldIndex("Zip"),
-                district = t.FieldIndex("District"), details = t.FieldIndex("Details"),
-                telephone = t.FieldIndex("Telephone");
+    // A new row of `t` for account `key`, ordered n-th, with its texts set.
+    auto add = [](db::TableRecordset& t, int64_t n, const std::string& key,
+                  std::initializer_list<std::pair<const char*, const Text*>> texts) {
+      t.AddNew();
       char order[16];
-      int n = 0;
-      for (const AccountRow& a : accounts) {
-        t.AddNew();
-        std::snprintf(order, sizeof order, "%08d", ++n);
-        t.SetText(key, a.key);
-        t.SetText(sortKey, order);
-        t.SetText(sortName, order);
-        t.SetDouble(sortVal, n);
-        const std::pair<int, const Text*> texts[] = {
-            {name, &a.name},         {address, &a.address}, {city, &a.city},          {zip, &a.zip},
-            {district, &a.district}, {details, &a.details}, {telephone, &a.telephone}};
-        for (const auto& [field, value] : texts) {
-          // Like the importers, an empty text is left Null.
-          if (value->has_value() && !(*value)->empty()) t.SetText(field, **value);
-        }
-        t.Update();
-      }
-      t.Close();
+      std::snprintf(order, sizeof order, "%08lld", static_cast<long long>(n));
+      t.Set("AccountKey", key);
+      t.Set("SortByName", std::string(order));
+      for (const auto& [field, value] : texts)
+        if (value->has_value() && !(*value)->empty()) t.Set(field, **value);
+      return std::string(order);
+    };
+    db::TableRecordset t = database.OpenTable("tAccount");
+    int64_t n = 0;
+    for (const AccountRow& a : accounts) {
+      t.Set("SortByKey", add(t, ++n, a.key,
+                             {{"AccountName", &a.name}, {"Address", &a.address}, {"City", &a.city},
+                              {"Zip", &a.zip}, {"District", &a.district}, {"Details", &a.details},
+                              {"Telephone", &a.telephone}}));
+      t.Set("SortByKeyVal", static_cast<double>(n));
+      t.Update();
     }
-    if (!heads.empty()) {
-      db::TableRecordset t = database.OpenTable("tStockHead");
-      char order[16];
-      int n = 0;
-      for (const HeadRow& h : heads) {
-        t.AddNew();
-        std::snprintf(order, sizeof order, "%08d", ++n);
-        t.Set("CompID", int64_t{1});
-        t.Set("TavFileID", int64_t{3});
-        t.Set("HeadIndx", int64_t{n});
-        t.Set("DocType2", int64_t{1});
-        t.Set("Reference1", h.reference);
-        t.Set("AccountKey", h.key);
-        t.Set("SortByName", std::string(order));
-        t.SetBool(t.FieldIndex("Include"), true);
-        if (h.customerName) t.Set("CustomerName", *h.customerName);
-        if (h.address1) t.Set("Address1", *h.address1);
-        if (h.address2) t.Set("Address2", *h.address2);
-        if (h.detailsLine1) t.Set("DetailsLine1", *h.detailsLine1);
-        t.Update();
-      }
-      t.Close();
+    t.Close();
+    db::TableRecordset h = database.OpenTable("tStockHead");
+    n = 0;
+    for (const HeadRow& r : heads) {
+      add(h, ++n, r.key,
+          {{"CustomerName", &r.customerName}, {"Address1", &r.address1},
+           {"Address2", &r.address2}, {"DetailsLine1", &r.detailsLine1}});
+      for (const auto& [field, value] : {std::pair<const char*, int64_t>{"CompID", 1},
+                                         {"TavFileID", 3}, {"HeadIndx", n}, {"DocType2", 1},
+                                         {"Reference1", r.reference}})
+        h.Set(field, value);
+      h.SetBool(h.FieldIndex("Include"), true);
+      h.Update();
     }
+    h.Close();
     database.Close();
     return path;
   }
