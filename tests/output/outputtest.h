@@ -29,7 +29,7 @@ using Text = std::optional<std::string>;
 
 struct AccountRow {
   std::string key;
-  Text name, address, city, zip, district, details, telephone;
+  Text name = {}, address = {}, city = {}, zip = {}, district = {}, details = {}, telephone = {};
 };
 
 // A document header of the chosen type, joined to its account by `key`.
@@ -104,8 +104,12 @@ class OutputTest : public ::testing::Test {
     int64_t n = 0;
     for (const AccountRow& a : accounts) {
       t.Set("SortByKey", add(t, ++n, a.key,
-                             {{"AccountName", &a.name}, {"Address", &a.address}, {"City", &a.city},
-                              {"Zip", &a.zip}, {"District", &a.district}, {"Details", &a.details},
+                             {{"AccountName", &a.name},
+                              {"Address", &a.address},
+                              {"City", &a.city},
+                              {"Zip", &a.zip},
+                              {"District", &a.district},
+                              {"Details", &a.details},
                               {"Telephone", &a.telephone}}));
       t.Set("SortByKeyVal", static_cast<double>(n));
       t.Update();
@@ -115,10 +119,14 @@ class OutputTest : public ::testing::Test {
     n = 0;
     for (const HeadRow& r : heads) {
       add(h, ++n, r.key,
-          {{"CustomerName", &r.customerName}, {"Address1", &r.address1},
-           {"Address2", &r.address2}, {"DetailsLine1", &r.detailsLine1}});
+          {{"CustomerName", &r.customerName},
+           {"Address1", &r.address1},
+           {"Address2", &r.address2},
+           {"DetailsLine1", &r.detailsLine1}});
       for (const auto& [field, value] : {std::pair<const char*, int64_t>{"CompID", 1},
-                                         {"TavFileID", 3}, {"HeadIndx", n}, {"DocType2", 1},
+                                         {"TavFileID", 3},
+                                         {"HeadIndx", n},
+                                         {"DocType2", 1},
                                          {"Reference1", r.reference}})
         h.Set(field, value);
       h.SetBool(h.FieldIndex("Include"), true);
@@ -140,6 +148,15 @@ class OutputTest : public ::testing::Test {
   }
 
   std::string PathOf(const std::string& name) const { return (dir_ / name).string(); }
+
+  // What `script` prints when Python runs it on `args`; the run must succeed.
+  std::string RunPython(const std::string& script, const std::string& args) {
+    std::ofstream(PathOf("read.py")) << script;
+    const std::string cmd = "PYTHONIOENCODING=utf-8 " + Python() + " " + PathOf("read.py") + " " +
+                            args + " > " + PathOf("read.out") + " 2>&1";
+    EXPECT_EQ(std::system(cmd.c_str()), 0) << ReadBytes(PathOf("read.out"));
+    return ReadBytes(PathOf("read.out"));
+  }
   std::string Utf8File(const std::string& path) const { return Win1255ToUtf8(ReadBytes(path)); }
 
   test::ScratchTemp scratch_;

@@ -86,12 +86,5 @@ TEST_F(AddressListTest, EmptyHeaderFieldPrintedTheWordNull) {
   EXPECT_NE(list.find(Row("", "&nbsp;", "&nbsp;", "דנה", "&nbsp;")), std::string::npos) << list;
 }
 
-TEST_F(AddressListTest, ValuesWithMarkupAreEscaped) {
-  const std::string list = Write({{"1", "A&B <סניף>", "<i>", "a&b", "<9>", "", "x>y", ""}});
-  EXPECT_NE(list.find(Row("&lt;9&gt;", "a&amp;b", "&lt;i&gt;", "x&gt;y", "A&amp;B &lt;סניף&gt;")),
-            std::string::npos)
-      << list;
-}
-
 }  // namespace
 }  // namespace zdr::test

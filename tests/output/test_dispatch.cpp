@@ -23,19 +23,6 @@ class DispatchTest : public OutputTest {
   }
 };
 
-TEST(CsvFieldTest, CleansAndCutsCharacters) {
-  const std::tuple<db::Value, int, std::string> cases[] = {
-      {db::Value{}, 0, ""},
-      {std::string("כהן, משה"), 0, "כהן  משה"},
-      {std::string(",,a,"), 0, "  a "},
-      {std::string("אבגדה"), 3, "אבג"},
-      {std::string("אבג"), 10, "אבג"},
-      {std::string(" \"x\" "), 0, " \"x\" "},
-      {std::string("רחוב\r\nהרצל\n5\r"), 0, "רחוב  הרצל 5 "},
-      {int64_t{1000}, 0, "1000"}};
-  for (const auto& [value, cut, want] : cases) EXPECT_EQ(CsvField(value, cut), want) << want;
-}
-
 // Every layout byte for byte: the columns after the name, the cuts of layout 0, the date of
 // layout 1, the document variant's number and remarks; commas and line breaks in fields and
 // in the settings become blanks so that no column moves and every recipient keeps one row.
@@ -88,19 +75,13 @@ TEST_F(DispatchTest, CharacterOutsideCodePageIsAnError) {
 // left when it opens, handed to the spreadsheet.
 TEST_F(DispatchTest, WorkbookKeepsTextAndNumbers) {
   if (Python().empty()) GTEST_SKIP() << "python3 with openpyxl is not installed";
-  const std::string script = PathOf("read.py");
-  std::ofstream(script) << "import sys, openpyxl\n"
-                           "ws = openpyxl.load_workbook(sys.argv[1]).active\n"
-                           "print('%s|%d|%d' % (ws.sheet_view.rightToLeft, ws.max_row, "
-                           "ws.max_column))\n"
-                           "for row in ws.iter_rows():\n"
-                           "    print('|'.join('%s:%s' % (type(c.value).__name__, c.value) "
-                           "for c in row))\n";
   auto readBack = [&](const std::string& xlsx) {
-    const std::string cmd = "PYTHONIOENCODING=utf-8 " + Python() + " " + script + " " + xlsx +
-                            " > " + PathOf("read.txt") + " 2>&1";
-    EXPECT_EQ(std::system(cmd.c_str()), 0) << ReadBytes(PathOf("read.txt"));
-    return ReadBytes(PathOf("read.txt"));
+    return RunPython(
+        "import sys, openpyxl\nws = openpyxl.load_workbook(sys.argv[1]).active\n"
+        "print('%s|%d|%d' % (ws.sheet_view.rightToLeft, ws.max_row, ws.max_column))\n"
+        "for row in ws.iter_rows():\n"
+        "    print('|'.join('%s:%s' % (type(c.value).__name__, c.value) for c in row))\n",
+        xlsx);
   };
   post.Weight = "0.5";
   Write({{"0123", "כהן", "הרצל 5", "חיפה", "031000", "", "", "03-5551234"}}, 0);

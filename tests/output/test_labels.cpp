@@ -198,21 +198,15 @@ TEST_F(LabelSheetTest, BadGeometryIsAClearErrorAndKeepsTheOldFile) {
   EXPECT_EQ(ReadSheetGeometry(panel, true).rows, 32767);
 }
 
-TEST(HtmlHelpers, PercentOfOneHtmlValueAndSpreadInCells) {
-  const std::pair<int64_t, const char*> percents[] = {{8, "12.5"},    {3, "33.3"},  {12, "08.3"},
-                                                      {1, "100.0"},   {16, "06.3"}, {1000, "00.1"},
-                                                      {32767, "00.0"}};
-  for (const auto& [n, text] : percents) EXPECT_EQ(PercentOfOne(n), text) << n;
-  EXPECT_EQ(HtmlValue(db::Value{}), "&nbsp;");
-  EXPECT_EQ(HtmlValue(db::Value{std::string("a&b<c>")}), "a&amp;b&lt;c&gt;");
-  EXPECT_EQ(HtmlValue(db::Value{int64_t{1000}}), "1000");
-  const std::string open =
-      "<table cellspacing='0' cellpadding='0' border='0' align='right' dir='rtl'><tr>";
-  EXPECT_EQ(SpreadInCells(db::Value{std::string("א   ב ")}, ""),
-            open + "<td>א</td><td>&nbsp;</td><td>ב</td><td>&nbsp;</td></tr></table>");
-  EXPECT_EQ(SpreadInCells(db::Value{}, ""), open + "</tr></table>");
-  EXPECT_EQ(SpreadInCells(db::Value{std::string("&<")}, ""),
-            open + "<td>&amp;</td><td>&lt;</td></tr></table>");
+// A cell's share of the sheet in tenths of a per cent, rounded half up.
+TEST(HtmlHelpers, PercentOfOneRoundsToTenths) {
+  for (const auto& [n, text] : {std::pair<int64_t, const char*>{8, "12.5"},
+                                {3, "33.3"},
+                                {12, "08.3"},
+                                {16, "06.3"},
+                                {1000, "00.1"},
+                                {32767, "00.0"}})
+    EXPECT_EQ(PercentOfOne(n), text) << n;
 }
 
 }  // namespace

@@ -86,13 +86,6 @@ std::vector<Word> WordsIn(const Page& page, const LabelBox& b) {
   return in;
 }
 
-AccountRow Named(const std::string& key, const std::string& name) {
-  AccountRow row;
-  row.key = key;
-  row.name = name;
-  return row;
-}
-
 class PdfLabelsTest : public OutputTest {
  protected:
   void SetUp() override {
@@ -170,7 +163,7 @@ TEST_F(PdfLabelsTest, TextReadsBackInReadingOrder) {
   const std::vector<std::string> names = {"משה כהן",   "טלפון 0501234567", "כהן ABC Ltd",
                                           "משה (כהן)", "כהן בע\"מ",        "רח' המגדל 15"};
   std::vector<AccountRow> rows;
-  for (size_t i = 0; i < names.size(); ++i) rows.push_back(Named(std::to_string(i + 1), names[i]));
+  for (size_t i = 0; i < names.size(); ++i) rows.push_back({std::to_string(i + 1), names[i]});
   panel.ChkTitle = {1, 1, 0, 0, 0, 0, 0, 0, 0};
   for (int font = 0; font <= 2; ++font) {
     SCOPED_TRACE(font);
@@ -190,7 +183,7 @@ TEST_F(PdfLabelsTest, LongLinesShrinkThenEndInAnEllipsis) {
   const std::string tooLong = std::string("שם ארוך מאוד ") + std::string(80, 'x');
   panel.ChkTitle = {0, 1, 0, 0, 0, 0, 0, 0, 0};
   labels.LabelDefs[1].FontSize = 16;
-  const std::string pdf = Write(BuildDb({Named("1", shrinks), Named("2", tooLong)}), stock);
+  const std::string pdf = Write(BuildDb({{"1", shrinks}, {"2", tooLong}}), stock);
   const auto pages = Words(pdf);
   ASSERT_EQ(pages.size(), 1u);
   for (int position = 1; position <= 2; ++position)

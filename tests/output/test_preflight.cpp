@@ -179,28 +179,25 @@ TEST_F(PreflightTest, FindingsSheetLeavesTheDispatchSheetAsItWas) {
     ConvertToExcel(csv, PathOf("checked-" + tag + ".xlsx"), open, seam, {}, r.findings);
   }
   ConvertToExcel(csv, PathOf("shown.xlsx"), false, seam, {}, r.findings, true);
-  const std::string script = PathOf("read.py"), out = PathOf("read.out");
-  std::ofstream(script)
-      << "import sys, zipfile, openpyxl\n"
-         "for tag in ('closed', 'open'):\n"
-         "    a = zipfile.ZipFile(sys.argv[1] + '/plain-' + tag + '.xlsx')\n"
-         "    b = zipfile.ZipFile(sys.argv[1] + '/checked-' + tag + '.xlsx')\n"
-         "    print(a.read('xl/worksheets/sheet1.xml') == b.read('xl/worksheets/sheet1.xml'))\n"
-         "wb = openpyxl.load_workbook(sys.argv[1] + '/shown.xlsx')\n"
-         "print(wb.sheetnames, wb.active.title)\n"
-         "ws = wb['בדיקה']\n"
-         "print(ws.sheet_view.rightToLeft, ws.max_row)\n"
-         "print(set(type(c.value).__name__ for row in ws.iter_rows() for c in row if c.value is "
-         "not None))\n"
-         "print('|'.join(c.value or '' for c in ws[1]))\n"
-         "print('|'.join(c.value or '' for c in ws[2]))\n";
-  const std::string cmd = "PYTHONIOENCODING=utf-8 " + Python() + " " + script + " " +
-                          dir_.string() + " > " + out + " 2>&1";
-  EXPECT_EQ(std::system(cmd.c_str()), 0) << ReadBytes(out);
-  EXPECT_EQ(ReadBytes(out), "True\nTrue\n['Sheet1', 'בדיקה'] בדיקה\nTrue " +
-                                std::to_string(r.findings.size() + 1) +
-                                "\n{'str'}\nחומרה|שורה|מפתח חשבון|שדה|ערך|הודעה\n"
-                                "שגיאה|3|3|שם||חסר שם הנמען\n");
+  const std::string got = RunPython(
+      "import sys, zipfile, openpyxl\n"
+      "for tag in ('closed', 'open'):\n"
+      "    a = zipfile.ZipFile(sys.argv[1] + '/plain-' + tag + '.xlsx')\n"
+      "    b = zipfile.ZipFile(sys.argv[1] + '/checked-' + tag + '.xlsx')\n"
+      "    print(a.read('xl/worksheets/sheet1.xml') == b.read('xl/worksheets/sheet1.xml'))\n"
+      "wb = openpyxl.load_workbook(sys.argv[1] + '/shown.xlsx')\n"
+      "print(wb.sheetnames, wb.active.title)\n"
+      "ws = wb['בדיקה']\n"
+      "print(ws.sheet_view.rightToLeft, ws.max_row)\n"
+      "print(set(type(c.value).__name__ for row in ws.iter_rows() for c in row if c.value is "
+      "not None))\n"
+      "print('|'.join(c.value or '' for c in ws[1]))\n"
+      "print('|'.join(c.value or '' for c in ws[2]))\n",
+      dir_.string());
+  EXPECT_EQ(got, "True\nTrue\n['Sheet1', 'בדיקה'] בדיקה\nTrue " +
+                     std::to_string(r.findings.size() + 1) +
+                     "\n{'str'}\nחומרה|שורה|מפתח חשבון|שדה|ערך|הודעה\n"
+                     "שגיאה|3|3|שם||חסר שם הנמען\n");
 }
 
 }  // namespace
