@@ -13,17 +13,17 @@
 namespace zdr::test {
 namespace {
 
-// "row:rule" for every finding, in order.
-std::vector<std::string> Found(const PreflightResult& r) {
-  std::vector<std::string> out;
+using Rows = std::pair<std::vector<int64_t>, std::vector<RuleId>>;
+using enum RuleId;
+
+// The findings' rows and their rules, in order.
+Rows Found(const PreflightResult& r) {
+  Rows out;
   for (const Finding& f : r.findings) {
-    out.push_back(std::to_string(f.row) + ":" + std::string(RuleOf(f.rule).message));
+    out.first.push_back(f.row);
+    out.second.push_back(f.rule);
   }
   return out;
-}
-
-std::string At(int64_t row, RuleId id) {
-  return std::to_string(row) + ":" + std::string(RuleOf(id).message);
 }
 
 class PreflightTest : public OutputTest {
@@ -70,13 +70,10 @@ std::vector<AccountRow> OneRowPerRule() {
 // hold it and what was lost.
 TEST_F(PreflightTest, EachRuleFoundOnceOnItsRow) {
   const PreflightResult r = Check(OneRowPerRule(), 0);
-  EXPECT_EQ(Found(r), (std::vector<std::string>{
-                          At(3, RuleId::kNameMissing), At(4, RuleId::kAddressMissing),
-                          At(5, RuleId::kCityMissing), At(6, RuleId::kZipEmpty),
-                          At(7, RuleId::kZipMalformed), At(8, RuleId::kTelephoneMalformed),
-                          At(9, RuleId::kNameCut), At(10, RuleId::kAddressCut),
-                          At(11, RuleId::kCityCut), At(12, RuleId::kTelephoneCut),
-                          At(13, RuleId::kDuplicate), At(14, RuleId::kCharacter)}));
+  EXPECT_EQ(Found(r), Rows({3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14},
+                           {kNameMissing, kAddressMissing, kCityMissing, kZipEmpty, kZipMalformed,
+                            kTelephoneMalformed, kNameCut, kAddressCut, kCityCut, kTelephoneCut,
+                            kDuplicate, kCharacter}));
   EXPECT_EQ(std::tuple(r.rows, r.errors, r.warnings), std::tuple(13, 6, 6));
   EXPECT_EQ(seam.progress.back(), 0);
   std::map<int64_t, std::array<std::string, 6>> cells;
@@ -101,12 +98,10 @@ TEST_F(PreflightTest, CourierLayoutCutsNothingButChecksTheKey) {
   tabInKey.name = "לקוח 15";
   rows.push_back(tabInKey);
   const PreflightResult r = Check(rows, 1);
-  EXPECT_EQ(Found(r), (std::vector<std::string>{
-                          At(3, RuleId::kNameMissing), At(4, RuleId::kAddressMissing),
-                          At(5, RuleId::kCityMissing), At(6, RuleId::kZipEmpty),
-                          At(7, RuleId::kZipMalformed), At(8, RuleId::kTelephoneMalformed),
-                          At(12, RuleId::kTelephoneMalformed), At(13, RuleId::kDuplicate),
-                          At(14, RuleId::kCharacter), At(15, RuleId::kCharacter)}));
+  EXPECT_EQ(Found(r),
+            Rows({3, 4, 5, 6, 7, 8, 12, 13, 14, 15},
+                 {kNameMissing, kAddressMissing, kCityMissing, kZipEmpty, kZipMalformed,
+                  kTelephoneMalformed, kTelephoneMalformed, kDuplicate, kCharacter, kCharacter}));
   EXPECT_EQ(r.findings.back().field, "מפתח חשבון");
   EXPECT_EQ(r.findings.back().message, "תווים שהקובץ אינו יכול לשאת: U+0009");
 }
@@ -140,7 +135,7 @@ TEST_F(PreflightTest, DocumentVariantChecksNoZip) {
         Check({kClean}, layout,
               {{"1", 501, "כהן משה", "הרצל 5", "חיפה", "הערה"},
                {"1", 502, "לוי", std::nullopt, "עכו", std::string(100, 'r')}});
-    EXPECT_EQ(Found(r), std::vector<std::string>{At(3, RuleId::kAddressMissing)});
+    EXPECT_EQ(Found(r), Rows({3}, {kAddressMissing}));
   }
 }
 
