@@ -359,13 +359,10 @@ TEST_F(CliTest, NoCommandWithoutADisplayAborted) {
 // A page cell or dispatch field as the clerk reads it: markup undone, a comma as the
 // dispatch file writes it (a blank), no surrounding blanks.
 std::string Readable(std::string t) {
-  for (const auto& [from, to] : {std::pair<std::string, std::string>{"&nbsp;", ""},
-                                 {"&lt;", "<"},
-                                 {"&gt;", ">"},
-                                 {"&amp;", "&"},
-                                 {",", " "}}) {
-    for (size_t p = t.find(from); p != std::string::npos; p = t.find(from, p + to.size()))
-      t.replace(p, from.size(), to);
+  const std::string undo[] = {"&nbsp;", "", "&lt;", "<", "&gt;", ">", "&amp;", "&", ",", " "};
+  for (size_t i = 0; i < std::size(undo); i += 2) {
+    for (size_t p = t.find(undo[i]); p != t.npos; p = t.find(undo[i], p + undo[i + 1].size()))
+      t.replace(p, undo[i].size(), undo[i + 1]);
   }
   const size_t first = t.find_first_not_of(' ');
   return first == t.npos ? "" : t.substr(first, t.find_last_not_of(' ') - first + 1);

@@ -74,7 +74,7 @@ TEST_F(DispatchTest, CharacterOutsideCodePageIsAnError) {
 // The workbook, read back with openpyxl: text cells but for the reference number, right to
 // left when it opens, handed to the spreadsheet.
 TEST_F(DispatchTest, WorkbookKeepsTextAndNumbers) {
-  if (Python().empty()) GTEST_SKIP() << "python3 with openpyxl is not installed";
+  if (!HavePython()) GTEST_SKIP() << "python3 with openpyxl is not installed";
   auto readBack = [&](const std::string& xlsx) {
     return RunPython(
         "import sys, openpyxl\nws = openpyxl.load_workbook(sys.argv[1]).active\n"

@@ -160,7 +160,7 @@ TEST(FindingsCsvTest, HeaderThenQuotedCells) {
 // The workbook's findings sheet, read back with Python: the dispatch sheet is the same with
 // and without it; it reads right to left, holds text only and can open first.
 TEST_F(PreflightTest, FindingsSheetLeavesTheDispatchSheetAsItWas) {
-  if (Python().empty()) GTEST_SKIP() << "python3 with openpyxl is not installed";
+  if (!HavePython()) GTEST_SKIP() << "python3 with openpyxl is not installed";
   std::vector<AccountRow> rows = OneRowPerRule();
   rows.pop_back();  // a character the file cannot hold would stop CreateCSV
   const std::string db = BuildDb(rows);
