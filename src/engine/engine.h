@@ -75,6 +75,8 @@ struct TableDef {
   // own as rows are appended, so that a statement's "(Select Distinct F From T)" reads those
   // values instead of every row of T. Kept only while every row came through a recordset: a
   // statement that changes the table's rows drops them, and the subquery then reads T again.
+  // Another database file writing T through a link goes unseen: keep them only for tables
+  // that no other file links to.
   std::vector<std::string> keptDistinct;
 
   explicit TableDef(std::string n) : name(std::move(n)) {}
