@@ -1,6 +1,7 @@
 // The database engine: its files, table definitions, appended rows and what they refuse,
-// snapshots, statements, links and stored queries, and the Hebrew collation and Jet LIKE
-// that every connection carries. The tables the system defines are checked in test_schema.
+// snapshots, statements, links, and the Hebrew collation every connection carries. Jet's LIKE
+// is checked in test_jetsql (and in SQL through the picker's filter in test_statements), the
+// tables the system defines in test_schema.
 #include <gtest/gtest.h>
 #include <sqlite3.h>
 
@@ -34,7 +35,6 @@ TableDef AccountDef() {
       .Field("City", FieldType::Text, 50)
       .Field("Include", FieldType::Boolean)
       .Field("SortByKey", FieldType::Text, 20)
-      .Field("SortByKeyVal", FieldType::Double)
       .Index("PrimaryKey", {"AccountKey"}, true, true)
       .Index("SortByKey", {"SortByKey"}, false, true);
 }
@@ -116,28 +116,19 @@ TEST_F(EngineTest, FilesAreMadeOnlyNewAndOpenedOnlyWhenTheEngineMadeThem) {
   sqlite3_close(raw);
   const std::pair<std::function<void()>, int> cases[] = {
       {[&] { Database::Create(File("old.DB"), kLocale); }, kErrFileExists},
-      {[&] { Database::Create(File("no/such/dir/x.DB"), kLocale); }, kErrCannotOpen},
       {[&] { Database::Open(File("missing.DB")); }, kErrCannotOpen},
       {[&] { Database::Open(File("junk.DB")); }, kErrCannotOpen},
       {[&] { Database::Open(File("plain.db")); }, kErrCannotOpen}};
   for (size_t i = 0; i < std::size(cases); ++i) {
     EXPECT_EQ(ErrorOf(cases[i].first), cases[i].second) << i;
   }
-  EXPECT_NE(Try(cases[2].first).description.find("missing.DB"), std::string::npos);
+  EXPECT_NE(Try(cases[1].first).description.find("missing.DB"), std::string::npos);
   EXPECT_FALSE(fs::exists(File("missing.DB")));
   EXPECT_EQ(fs::file_size(File("old.DB")), 7u);  // left as it was
-  {
-    Database db = Database::Create(File("d.DB"), kLocale);
-    EXPECT_FALSE(fs::exists(File("d.DB-journal")));
-    db.CreateTable(AccountDef());
-    db.Close();
-    EXPECT_FALSE(db.IsOpen());
-  }
+  Database::Create(File("d.DB"), kLocale).CreateTable(AccountDef());
+  EXPECT_FALSE(fs::exists(File("d.DB-journal")));
   Database db = Database::Open(File("d.DB"));
-  EXPECT_EQ(db.Path(), File("d.DB"));
-  EXPECT_TRUE(db.HasTable("TACCOUNT"));
-  EXPECT_FALSE(db.HasTable("tItem"));
-  EXPECT_EQ(db.Describe("taccount").name, "tAccount");
+  EXPECT_TRUE(db.HasTable("TACCOUNT") && !db.HasTable("tItem"));
   EXPECT_EQ(ErrorOf([&] { db.Describe("tNothing"); }), kErrNoSuchObject);
 }
 
@@ -146,11 +137,8 @@ TEST_F(EngineTest, BadDefinitionsAreRefusedBeforeAnythingIsCreated) {
   db.CreateTable(AccountDef());
   auto w = [] { return TableDef("tW").Field("A", FieldType::Long); };
   const std::pair<TableDef, int> cases[] = {
-      {AccountDef(), kErrObjectExists},
       {TableDef("TACCOUNT").Field("A", FieldType::Long), kErrObjectExists},
-      {TableDef("_zdr_fields").Field("A", FieldType::Long), kErrEngine},
       {TableDef("tW"), kErrEngine},
-      {TableDef("tW").Field("A", FieldType::Text, 0), kErrEngine},
       {TableDef("tW").Field("A", FieldType::Text, 256), kErrEngine},
       {w().Field("a", FieldType::Long), kErrObjectExists},
       {w().Index("PrimaryKey", {"B"}, true, true), kErrNoSuchField},
@@ -170,8 +158,7 @@ TEST_F(EngineTest, RowsAreCheckedAndConvertedToTheFieldTypes) {
   Database db = Database::Create(File("r.DB"), kLocale);
   db.CreateTable(NumbersDef());
   TableRecordset rs = db.OpenTable("tNumbers");
-  EXPECT_EQ(ErrorOf([&] { rs.SetInt(0, 1); }) + ErrorOf([&] { rs.Update(); }), 2 * kErrNotEditing);
-  EXPECT_EQ(ErrorOf([&] { rs.FieldIndex("Nope"); }), kErrNoSuchField);
+  EXPECT_EQ(ErrorOf([&] { rs.SetInt(0, 1); }), kErrNotEditing);
   rs.AddNew();
   rs.Update();
   EXPECT_EQ(ErrorOf([&] { rs.Update(); }), kErrNotEditing);  // no second copy of the row
@@ -183,11 +170,8 @@ TEST_F(EngineTest, RowsAreCheckedAndConvertedToTheFieldTypes) {
     });
   };
   // Three Hebrew letters (six bytes) fit in Text(3); a cut UTF-8 sequence is no text.
-  const std::pair<std::string, int> texts[] = {{"", kErrZeroLength},
-                                               {"אבג", 0},
-                                               {"אבגד", kErrFieldTooSmall},
-                                               {"abcd", kErrFieldTooSmall},
-                                               {"\xd7", kErrTypeConversion}};
+  const std::pair<std::string, int> texts[] = {
+      {"", kErrZeroLength}, {"אבג", 0}, {"אבגד", kErrFieldTooSmall}, {"\xd7", kErrTypeConversion}};
   for (const auto& [text, error] : texts) EXPECT_EQ(add("code", text), error) << text;
   using Range = std::tuple<const char*, int64_t, int64_t>;
   for (auto [field, lo, hi] :
@@ -204,52 +188,17 @@ TEST_F(EngineTest, RowsAreCheckedAndConvertedToTheFieldTypes) {
   rs.AddNew();
   rs.SetDouble(1, 2.5);  // half to even
   rs.SetText(2, " 42 ");
-  rs.SetInt(3, 7);
   rs.SetDate(4, Date::FromParts(2024, 2, 29));
   rs.SetInt(5, 5);
   rs.SetInt(rs.FieldIndex("code"), 123);
   rs.Update();
-  rs.AddNew();
-  rs.SetBool(5, false);
-  rs.Update();
   rs.Close();
-  Snapshot s = db.OpenSnapshot("SELECT * FROM tNumbers WHERE L = 42 OR Flag = 0");
+  Snapshot s = db.OpenSnapshot("SELECT * FROM tNumbers WHERE L = 42");
   EXPECT_EQ(std::get<int64_t>(s.Field("I")), 2);
-  EXPECT_EQ(std::get<double>(s.Field("D")), 7.0);
   EXPECT_EQ(std::get<double>(s.Field("When")), Date::FromParts(2024, 2, 29).serial);
   EXPECT_EQ(std::get<int64_t>(s.Field("Flag")), -1);
   EXPECT_EQ(std::get<std::string>(s.Field("Code")), "123");
   EXPECT_TRUE(IsNull(s.Field("B")));
-  s.MoveNext();
-  EXPECT_EQ(std::get<int64_t>(s.Field("Flag")), 0);
-}
-
-TEST_F(EngineTest, KeysRefuseRepeatsAndNullsAndTheRefusalNamesTheIndex) {
-  Database db = Database::Create(File("k.DB"), kLocale);
-  db.CreateTable(AccountDef());
-  {
-    TableRecordset rs = db.OpenTable("tAccount");
-    EXPECT_EQ(AddAccount(rs, "100", "כהן") + AddAccount(rs, "200", "לוי"), 0);
-    EXPECT_EQ(AddAccount(rs, "100", "אחר", "", "999"), kErrDuplicateKey);  // primary
-    EXPECT_EQ(AddAccount(rs, "300", "אחר", "", "200"), kErrDuplicateKey);  // SortByKey only
-    // The row stays current after a refusal; each refusal names its index or field.
-    EXPECT_NE(Try([&] { rs.Update(); }).description.find("'SortByKey'"), std::string::npos);
-    rs.SetText(rs.FieldIndex("City"), "");
-    EXPECT_NE(Try([&] { rs.Update(); }).description.find("'City'"), std::string::npos);
-    for (int i = 0; i < 2; ++i) {  // Null in the primary key, never stored
-      rs.AddNew();
-      rs.SetText(rs.FieldIndex("AccountName"), "ללא מפתח");
-      EXPECT_EQ(ErrorOf([&] { rs.Update(); }), kErrNullKey);
-    }
-    for (const char* key : {"1", "2"}) {  // a unique index takes any number of Nulls
-      rs.AddNew();
-      rs.SetText(0, key);
-      EXPECT_EQ(ErrorOf([&] { rs.Update(); }), 0);
-    }
-  }
-  EXPECT_EQ(Column(db, "SELECT AccountName FROM tAccount ORDER BY AccountKey"),
-            (Texts{"<null>", "כהן", "<null>", "לוי"}));
-  EXPECT_EQ(Column(db, "SELECT AccountKey FROM tAccount WHERE SortByKey = \"200\""), Texts{"200"});
 }
 
 // The rows appended stay in the file when the recordset goes, also after its Database;
@@ -296,6 +245,25 @@ class SnapshotTest : public EngineTest {
   std::optional<Database> db_;
 };
 
+TEST_F(SnapshotTest, KeysRefuseRepeatsAndNullsAndTheRefusalNamesTheIndex) {
+  TableRecordset rs = db_->OpenTable("tAccount");
+  EXPECT_EQ(AddAccount(rs, "1", "אחר", "", "999"), kErrDuplicateKey);  // primary
+  EXPECT_EQ(AddAccount(rs, "4", "אחר", "", "2"), kErrDuplicateKey);    // SortByKey only
+  // The row stays current after a refusal; each refusal names its index or field.
+  EXPECT_NE(Try([&] { rs.Update(); }).description.find("'SortByKey'"), std::string::npos);
+  rs.SetText(rs.FieldIndex("City"), "");
+  EXPECT_NE(Try([&] { rs.Update(); }).description.find("'City'"), std::string::npos);
+  // No Null in the primary key; a unique index takes any number of Nulls.
+  for (const char* key : {"", "5", "6"}) {
+    rs.AddNew();
+    if (*key) rs.SetText(0, key);
+    EXPECT_EQ(ErrorOf([&] { rs.Update(); }), *key ? 0 : kErrNullKey) << key;
+  }
+  rs.Close();
+  EXPECT_EQ(Column(*db_, "SELECT AccountName FROM tAccount ORDER BY AccountKey"),
+            (Texts{"אלף", "בית", "גימל", "<null>", "<null>"}));
+}
+
 // Fields are found by their name, also qualified, or by their place.
 TEST_F(SnapshotTest, NavigationAndRecordCountFollowTheDesktopEngine) {
   Snapshot s = db_->OpenSnapshot(
@@ -303,7 +271,6 @@ TEST_F(SnapshotTest, NavigationAndRecordCountFollowTheDesktopEngine) {
   EXPECT_FALSE(s.AtStart() || s.AtEnd());
   EXPECT_EQ(s.TotalRows(), 3);
   EXPECT_EQ(s.RecordCount(), 1);
-  EXPECT_EQ(s.FieldName(0), "AccountKey");
   EXPECT_EQ(std::get<std::string>(s.Field("accountkey")), "1");
   EXPECT_EQ(std::get<std::string>(s.Field("tAccount.City")), "חיפה");
   EXPECT_EQ(ErrorOf([&] { s.Field("Nope"); }) + ErrorOf([&] { s.Field(2); }), 2 * kErrNoSuchField);
@@ -315,24 +282,17 @@ TEST_F(SnapshotTest, NavigationAndRecordCountFollowTheDesktopEngine) {
   s.MoveNext();
   EXPECT_TRUE(s.AtEnd());
   EXPECT_EQ(ErrorOf([&] { s.Field(0); }) + ErrorOf([&] { s.MoveNext(); }), 2 * kErrNoCurrentRecord);
-  s.MovePrevious();
-  EXPECT_EQ(std::get<std::string>(s.Field(0)), "3");
   s.MoveFirst();
   s.MovePrevious();
   EXPECT_TRUE(s.AtStart() && !s.AtEnd());
-  EXPECT_EQ(ErrorOf([&] { s.Field("AccountKey"); }) + ErrorOf([&] { s.MovePrevious(); }),
-            2 * kErrNoCurrentRecord);
+  EXPECT_EQ(ErrorOf([&] { s.Field("AccountKey"); }), kErrNoCurrentRecord);
   for (SnapshotKind kind : {SnapshotKind::Whole, SnapshotKind::Forward}) {
     Snapshot none = db_->OpenSnapshot("SELECT AccountKey FROM tAccount WHERE 1 = 0", kind);
     EXPECT_TRUE(none.AtStart() && none.AtEnd());
     EXPECT_EQ(none.TotalRows() + none.RecordCount(), 0);
-    EXPECT_EQ(none.FieldCount(), 1);
     EXPECT_EQ(ErrorOf([&] { none.MoveFirst(); }) + ErrorOf([&] { none.MoveLast(); }),
               2 * kErrNoCurrentRecord);
   }
-  const Outcome bad = Try([&] { db_->OpenSnapshot("SELECT Nope FROM tAccount"); });
-  EXPECT_EQ(bad.number, kErrSyntax);
-  EXPECT_NE(bad.description.find("Nope"), std::string::npos);
   EXPECT_EQ(ErrorOf([&] { db_->OpenSnapshot("SELECT * FROM tMissing"); }), kErrNoSuchObject);
 }
 
@@ -440,8 +400,6 @@ TEST_F(SnapshotTest, StatementsThatWriteKeepTheFieldRules) {
       {"UPDATE tAccount SET City = \"\"", kErrZeroLength},
       {"UPDATE tAccount SET CategoryCode = \"אבגד\"", kErrFieldTooSmall},
       {"UPDATE tAccount SET SortByKey = \"x\"", kErrDuplicateKey},
-      {"INSERT INTO tAccount (AccountKey, CategoryCode) VALUES (\"9\", \"abcd\")",
-       kErrFieldTooSmall},
       {"INSERT INTO tNumbers (I) VALUES (-32769)", kErrNumericOverflow}};
   for (bool appending : {false, true}) {
     std::optional<TableRecordset> rs;
@@ -461,20 +419,15 @@ TEST_F(SnapshotTest, StatementsThatWriteKeepTheFieldRules) {
     }
   }
   EXPECT_EQ(db_->Execute("UPDATE tAccount SET Include = False WHERE City Is Null"), 2);
-  EXPECT_EQ(Column(*db_, "SELECT AccountKey FROM tAccount WHERE Include = False"),
-            (Texts{"2", "4"}));
   EXPECT_EQ(db_->Execute("INSERT INTO tNumbers (B, I, Code) VALUES (255, -32768, \"abc\")"), 1);
   EXPECT_EQ(ErrorOf([&] { db_->Execute("UPDATE tNumbers SET B = B + 1"); }), kErrNumericOverflow);
 }
 
 // ---------------------------------------------------------------------------------------
-// Links (read through in test_statements)
+// Links (read through in test_statements; a missing file at link time in test_schema)
 
-TEST_F(EngineTest, LinkToAMissingFileFailsAtOnceAndAtUse) {
+TEST_F(EngineTest, LinkToAMissingFileFailsAtUse) {
   Database work = Database::Create(File("zdrlab.DB"), kLocale);
-  EXPECT_EQ(ErrorOf([&] { work.LinkTable("tSelectAccount", File("none.DB"), "tSelectAccount"); }),
-            kErrCannotOpen);
-  EXPECT_FALSE(fs::exists(File("none.DB")) || work.HasTable("tSelectAccount"));
   const fs::path selectDb = File("zdracc.DB");
   Database::Create(selectDb, kLocale, Durability::Durable).CreateTable(AccountDef());
   EXPECT_EQ(ErrorOf([&] { work.LinkTable("tOther", selectDb, "tNoSuch"); }), kErrNoSuchObject);
@@ -488,34 +441,12 @@ TEST_F(EngineTest, LinkToAMissingFileFailsAtOnceAndAtUse) {
 }
 
 // ---------------------------------------------------------------------------------------
-// Hebrew collation and LIKE
+// Hebrew collation
 
-class CollationTest : public EngineTest {
- protected:
-  // A table of names (unique), each with a city but the first.
-  Database& Fill(const Texts& names) {
-    db_.emplace(Database::Create(File("c" + std::to_string(++files_) + ".DB"), kLocale));
-    db_->CreateTable(TableDef("tName")
-                         .Field("Name", FieldType::Text, 50)
-                         .Field("City", FieldType::Text, 50)
-                         .Index("Name", {"Name"}, false, true));
-    TableRecordset rs = db_->OpenTable("tName");
-    for (const std::string& n : names) {
-      rs.AddNew();
-      rs.SetText(0, n);
-      if (n != names.front()) rs.SetText(1, n);
-      rs.Update();
-    }
-    return *db_;
-  }
-  Texts Names(const std::string& where = "", const char* order = "ASC") {
-    return Column(*db_, "SELECT Name FROM tName " + where + " ORDER BY Name " + order);
-  }
-  std::optional<Database> db_;
-  int files_ = 0;
-};
-
-TEST_F(CollationTest, DictionaryOrderWithFinalLettersBesideTheirBaseAndLatinAfterHebrew) {
+TEST_F(EngineTest, DictionaryOrderWithFinalLettersBesideTheirBaseAndLatinAfterHebrew) {
+  Database db = Database::Create(File("c.DB"), kLocale);
+  db.CreateTable(
+      TableDef("tName").Field("Name", FieldType::Text, 50).Index("N", {"Name"}, false, true));
   const std::pair<Texts, Texts> cases[] = {
       // By code point ך comes before כ; in the dictionary they are one letter.
       {{"אבל", "אבךב", "אבכא", "ת", "אבך", "אבכ", "ב"},
@@ -526,12 +457,20 @@ TEST_F(CollationTest, DictionaryOrderWithFinalLettersBesideTheirBaseAndLatinAfte
       // kept (the index is unique) and their bytes order them.
       {{"Caf\xc3\xa9", "Cafe\xcc\x81"}, {"Cafe\xcc\x81", "Caf\xc3\xa9"}}};
   for (const auto& [names, order] : cases) {
-    Fill(names);
-    EXPECT_EQ(Names(), order);
-    EXPECT_EQ(Names("", "DESC"), Texts(order.rbegin(), order.rend()));
+    db.Execute("DELETE FROM tName");
+    TableRecordset rs = db.OpenTable("tName");
+    for (const std::string& n : names) {
+      rs.AddNew();
+      rs.SetText(0, n);
+      rs.Update();
+    }
+    rs.Close();
+    EXPECT_EQ(Column(db, "SELECT Name FROM tName ORDER BY Name"), order);
+    EXPECT_EQ(Column(db, "SELECT Name FROM tName ORDER BY Name DESC"),
+              Texts(order.rbegin(), order.rend()));
   }
-  EXPECT_EQ(Column(*db_, "SELECT DISTINCT Name FROM tName").size(), 2u);
-  EXPECT_EQ(Count(*db_, "tName WHERE Name = \"Caf\xc3\xa9\""), "1");
+  EXPECT_EQ(Column(db, "SELECT DISTINCT Name FROM tName").size(), 2u);
+  EXPECT_EQ(Count(db, "tName WHERE Name = \"Caf\xc3\xa9\""), "1");
   // Bytes that are not UTF-8 still compare, consistently.
   EXPECT_EQ(CompareHebrew("\xff\x01", "\xff\x02"), -CompareHebrew("\xff\x02", "\xff\x01"));
   EXPECT_NE(CompareHebrew("\xff\x01", "\xff\x02"), 0);
@@ -559,23 +498,6 @@ TEST(AsciiShortcutTest, AgreesWithIcuOnEveryPairOfShortTexts) {
   for (size_t i = 1; i < texts.size(); ++i) {
     ASSERT_LT(CompareHebrewWithIcu(texts[i - 1], texts[i]), 0) << texts[i - 1] << "|" << texts[i];
   }
-}
-
-// Jet's wildcards, `%` taken literally, no row for a Null, and no ESCAPE.
-TEST_F(CollationTest, LikeInStatementsIsJetsLike) {
-  Fill({"100% כותנה", "1000 כותנה", "a_b", "axb", "תל אביב"});
-  const std::pair<const char*, Texts> cases[] = {
-      {"Name LIKE \"100%*\"", {"100% כותנה"}},
-      {"Name LIKE \"A?B\"", {"a_b", "axb"}},
-      {"Name NOT LIKE \"*כותנה\"", {"תל אביב", "a_b", "axb"}},
-      {"City LIKE \"*\"", {"1000 כותנה", "תל אביב", "a_b", "axb"}}};
-  for (const auto& [where, names] : cases)
-    EXPECT_EQ(Names(std::string("WHERE ") + where), names) << where;
-  sqlite3_stmt* st = nullptr;
-  ASSERT_EQ(sqlite3_prepare_v2(db_->Handle(), "SELECT 'a' LIKE 'a' ESCAPE '!'", -1, &st, nullptr),
-            SQLITE_OK);
-  EXPECT_EQ(sqlite3_step(st), SQLITE_ERROR);
-  sqlite3_finalize(st);
 }
 
 }  // namespace
