@@ -7,11 +7,11 @@
 #include <unistd.h>
 
 #include <algorithm>
-#include <array>
-#include <cstdio>
+#include <atomic>
+#include <cstdlib>
 #include <filesystem>
 #include <fstream>
-#include <functional>
+#include <future>
 #include <memory>
 #include <set>
 #include <sstream>
@@ -62,23 +62,14 @@ bool Matches(const std::string& text, const std::string& spec) {
   return text.find(spec) != std::string::npos;
 }
 
-const std::string kBusy = "תפוסים בידי הפעלה אחרת של התוכנה";
-
 class CliTest : public ::testing::Test {
  protected:
   static void SetUpTestSuite() {
     scratch_ = new zdr::test::ScratchTemp;
-    zdrgen::Options options;
-    options.seed = 11;
-    options.accounts = 60;
-    options.documents = 40;
-    truth_ = new zdrgen::CompanyTruth(
-        zdrgen::WriteCompany(scratch_->dir() / "company", options, "חברה לדוגמה"));
+    zdrgen::WriteCompany(scratch_->dir() / "company", {.seed = 11, .accounts = 60, .documents = 40},
+                         "חברה לדוגמה");
   }
-  static void TearDownTestSuite() {
-    delete truth_;
-    delete scratch_;
-  }
+  static void TearDownTestSuite() { delete scratch_; }
   void SetUp() override {
     NewTemp(::testing::UnitTest::GetInstance()->current_test_info()->name());
   }
@@ -95,56 +86,36 @@ class CliTest : public ::testing::Test {
 
   // `text` with {C} the company folder, {S} the settings file and {T} the temporary folder.
   std::string Expand(std::string text) const {
-    const std::pair<std::string, std::string> names[] = {
-        {"{C}", company_.string()}, {"{S}", settings_.string()}, {"{T}", temp_.string()}};
-    for (const auto& [from, to] : names) {
+    for (const auto& [from, to] : {std::pair{"{C}", company_}, {"{S}", settings_}, {"{T}", temp_}})
       for (size_t at = text.find(from); at != std::string::npos; at = text.find(from, at))
-        text.replace(at, from.size(), to);
-    }
+        text.replace(at, 3, to.string());
     return text;
   }
 
-  // Starts zdrlab with `args` split at blanks and expanded, "@cmd" standing for
+  // Runs zdrlab with `args` split at blanks and expanded, "@cmd" standing for
   // cmd --company {C} --settings {S}; `env` is put before the command (NAME=VALUE words, or
-  // a command such as "timeout 30 env").
-  FILE* Start(const std::string& args, const std::string& env = "") {
+  // a command such as "timeout 30 env"). Safe to call from two threads at once.
+  RunResult Run(const std::string& args, const std::string& env = "") {
     std::string cmd = Expand(env) + " Temp=" + Quote(temp_.string()) + " " +
                       Quote(std::string(ZDR_BINARY_DIR) + "/src/zdrlab");
-    for (const auto& word : Split(args, ' ')) {
-      const bool base = word.starts_with("@");
-      for (const auto& a :
-           base ? std::vector<std::string>{word.substr(1), "--company", "{C}", "--settings", "{S}"}
-                : std::vector<std::string>{word})
-        cmd += " " + Quote(Expand(a));
-    }
-    cmd += " 2>" + Quote((temp_ / ("stderr" + std::to_string(++runs_))).string());
-    FILE* pipe = ::popen(cmd.c_str(), "r");
-    EXPECT_NE(pipe, nullptr);
-    return pipe;
-  }
-  RunResult Finish(FILE* pipe, int run) {
-    RunResult r;
-    std::array<char, 4096> buf;
-    for (size_t n; (n = std::fread(buf.data(), 1, buf.size(), pipe)) > 0;)
-      r.out.append(buf.data(), n);
-    const int status = ::pclose(pipe);
-    r.exitCode = WIFEXITED(status) ? WEXITSTATUS(status) : -1;
-    r.err = ReadBytes(temp_ / ("stderr" + std::to_string(run)));
-    return r;
-  }
-  RunResult Run(const std::string& args, const std::string& env = "") {
-    FILE* pipe = Start(args, env);
-    return Finish(pipe, runs_);
+    std::vector<std::string> words = Split(args, ' ');
+    if (!words.empty() && words[0].starts_with("@"))
+      words = Split(
+          words[0].substr(1) + " --company {C} --settings {S}" + args.substr(words[0].size()), ' ');
+    for (const auto& word : words) cmd += " " + Quote(Expand(word));
+    const std::string out = (temp_ / ("run" + std::to_string(++runs_))).string();
+    const int status =
+        std::system((cmd + " >" + Quote(out + ".out") + " 2>" + Quote(out + ".err")).c_str());
+    return {WIFEXITED(status) ? WEXITSTATUS(status) : -1, ReadBytes(out + ".out"),
+            ReadBytes(out + ".err")};
   }
 
   static zdr::test::ScratchTemp* scratch_;
-  static zdrgen::CompanyTruth* truth_;
   fs::path temp_, settings_;
-  int runs_ = 0;
+  std::atomic<int> runs_ = 0;
 };
 
 zdr::test::ScratchTemp* CliTest::scratch_ = nullptr;
-zdrgen::CompanyTruth* CliTest::truth_ = nullptr;
 
 // A stand-in for the desktop's opener in `bin`: copies the file it is given to $COPY_TO, or
 // fails with `exitCode`.
@@ -164,18 +135,18 @@ std::string Part(const std::string& text, size_t part) {
   return text.substr(from, text.find(';', from) - from);
 }
 
-// One run, or several split at ';' that end alike (or with an err and files part each). Args are
-// split at blanks, "@cmd" standing for cmd --company {C} --settings {S}; `out` and `err` hold specs
-// for Matches split at '|', the err ones found in order; `files` holds "name spec" pairs split at
-// '|' for files in the temporary folder, the spec "-" for no such file and "#" for a file of its
-// own (not a link). `setup` names what the folder holds before the run.
+// One run, or several split at ';' that end alike (or with an out, err, files and env part
+// each). Args are split at blanks, "@cmd" standing for cmd --company {C} --settings {S}; `out`
+// and `err` hold specs for Matches split at '|', the err ones found in order; `files` holds
+// "name spec" pairs split at '|' for files in the temporary folder, the spec "-" for no such
+// file and "#" for a file of its own (not a link). `setup` names what the folder holds before
+// the run.
 struct CliRun {
   const char *name, *args;
   int exit;
   const char *out = "", *err = "", *files = "", *env = "", *setup = "";
 };
 
-const std::string kPost = "FilePath={T}/post.xlsx";
 const std::string kFindings =
     "^חומרה,שורה,מפתח חשבון,שדה,ערך,הודעה\n|,טלפון,123-45,הטלפון אינו מספר ישראלי\n";
 
@@ -185,8 +156,6 @@ const CliRun kRuns[] = {
      "מאתחל בסיס נתונים|קורא רשימת כרטיסים|קריאת הנתונים הסתיימה|מכין רשימה|הכנת הרשימה הסתיימה",
      "zdrlab1.htm ^<HTML>"},
     {"WorkingDatabaseWasReadableByEveryone", "@labels", 0, "", "", "zdrlab.DB #600"},
-    {"ListCountsTheRecipients", "@list", 0, "={T}/zdrlab2.htm\n", "",
-     "zdrlab2.htm מספר הכרטיסים ברשימה: |zdrlab2.htm מספר הדפים הנדרשים: "},
     {"PostWithoutOutputFileIsRefused", "@post", 1, "=", "לא הוגדר קובץ פלט|!מאתחל בסיס נתונים"},
     {"PostWritesTheWorkbook", "@post --set FilePath={T}/post.xlsx --set Weight=0.5", 0,
      "={T}/post.xlsx\n", "הכנת הקובץ הסתיימה. שגיאות: ",
@@ -194,14 +163,16 @@ const CliRun kRuns[] = {
     // The generated company holds rows the post refuses, planted on purpose.
     {"PostCheckPrintsTheFindings", "@post --set FilePath={T}/post.xlsx --check", 0, nullptr,
      "הבדיקה הסתיימה. שגיאות: ", "zdpost1.csv -|post.xlsx -"},
-    {"CheckAndStrictRefuseTheErrors", "@post --set FilePath={T}/post.xlsx --check --strict", 3},
-    {"StrictRefusesTheErrors", "@post --set FilePath={T}/post.xlsx --strict", 3, nullptr,
-     "הקובץ לא נכתב. שגיאות: ", "zdpost1.csv -|post.xlsx -"},
-    {"CheckIsForThePostOnly", "@labels --check", 2},
+    {"StrictRefusesTheErrors",
+     "@post --set FilePath={T}/post.xlsx --check --strict;@post --set FilePath={T}/post.xlsx "
+     "--strict",
+     3, nullptr, ";הקובץ לא נכתב. שגיאות: ", "zdpost1.csv -|post.xlsx -"},
     {"MissingCompanyFolderReportsTheAccountFault", "labels --company {T}/none --settings {S}", 1,
      "", "תקלה בקריאת החשבונות"},
-    {"WrongUsage", "--bogus;print;labels --company;labels --bogus;labels --open=yes", 2},
-    {"UnknownSetting", "@labels --set NoSuchKey=1", 2, "", "NoSuchKey"},
+    {"WrongUsage",
+     "--bogus;print;labels --company;labels --bogus;labels --open=yes;@labels --check;"
+     "@labels --set NoSuchKey=1",
+     2, "", ";;;;;;NoSuchKey"},
     {"SetValueTheControlRefusesStopsBeforeTheCommand", "@labels --set SortBy=12", 2, "", "",
      "zdrlab1.htm -"},
     {"RunWaitingOnAHeldTempFolderTouchedTheOtherRunsFiles", "@labels", 1, "",
@@ -219,15 +190,13 @@ const CliRun kRuns[] = {
     {"EqualsFormOfAnOptionWasRefused",
      "post --company={C} --settings={S} --set=FilePath={T}/post.xlsx --set=FileFormat=1", 0,
      "={T}/post.xlsx\n", "", "zdpost1.csv ^קוד לקוח,"},
-    {"OpenReportedSuccessWhenNoProgramStarted", "@labels --open", 1, "=", "לא ניתן לפתוח", "",
-     "PATH={T}/none"},
-    {"OpenReportedSuccessWhenNoProgramStarted", "@labels --open", 1, "=", "לא ניתן לפתוח", "",
-     "PATH={T}/bin", "opener"},
-    {"LabelsAsPdfOnStock",
-     "@labels --set UseTitle1=1 --pdf {T}/labels.pdf --template a4-2x4-105x74 --offset 0.5,-1", 0,
-     "={T}/labels.pdf\n", "", "labels.pdf ^%PDF-|zdrlab1.htm -"},
-    {"CalibrationPage", "calibrate --settings {S} --pdf {T}/calibration.pdf", 0, "", "",
-     "calibration.pdf ^%PDF-"},
+    {"OpenReportedSuccessWhenNoProgramStarted", "@labels --open;@labels --open", 1, "=",
+     "לא ניתן לפתוח", "", "PATH={T}/none;PATH={T}/bin", "opener"},
+    {"LabelsAsPdfOnStockAndCalibrationPage",
+     "@labels --set UseTitle1=1 --pdf {T}/labels.pdf --template a4-2x4-105x74 --offset 0.5,-1;"
+     "calibrate --settings {S} --pdf {T}/calibration.pdf",
+     0, "={T}/labels.pdf\n;={T}/calibration.pdf\n", "",
+     "labels.pdf ^%PDF-|zdrlab1.htm -;calibration.pdf ^%PDF-"},
     {"SettingsThatAskForThePdfGiveIt", "@labels", 0, "={T}/zdrlab1.pdf\n", "", "zdrlab1.pdf ^%PDF-",
      "", "pdfsettings"},
     {"PdfOptionsAreChecked",
@@ -236,10 +205,10 @@ const CliRun kRuns[] = {
      "labels --pdf {T}/x.pdf --offset 0.05,0 --settings {S};"
      "labels --pdf {T}/x.pdf --template none --settings {S};list --pdf {T}/x.pdf --settings {S}",
      2, "", "", "x.pdf -"},
-    {"LinkPlantedInTempRedirectedTheOutput", "@list", 0, "", "",
-     "victim =not yours|zdrlab.DB #|zdrlab2.htm #", "", "links"},
-    {"LinkPlantedInTempRedirectedTheOutput", "@post --set FilePath={T}/p.xlsx", 0, "", "",
-     "victim =not yours|zdrlab.DB #|zdpost1.csv #", "", "links"},
+    {"LinkPlantedInTempRedirectedTheOutput", "@list;@post --set FilePath={T}/p.xlsx", 0,
+     "={T}/zdrlab2.htm\n;={T}/p.xlsx\n", "",
+     "victim =not yours|zdrlab.DB #|zdrlab2.htm #;victim =not yours|zdrlab.DB #|zdpost1.csv #", "",
+     "links"},
     // A bad dispatch target is refused before anything is loaded; nothing at it or in the
     // company folder changes.
     {"PostDeletedTheTargetBeforeCheckingIt",
@@ -256,11 +225,11 @@ const CliRun kRuns[] = {
      "targets"},
 };
 
-// The company folder's files and their bytes.
+// A company folder's file names and their bytes.
 std::vector<std::pair<fs::path, std::string>> Snapshot(const fs::path& folder) {
   std::vector<std::pair<fs::path, std::string>> files;
   for (const auto& e : fs::directory_iterator(folder))
-    files.emplace_back(e.path(), ReadBytes(e.path()));
+    files.emplace_back(e.path().filename(), ReadBytes(e.path()));
   std::sort(files.begin(), files.end());
   return files;
 }
@@ -304,17 +273,16 @@ TEST_F(CliTest, EveryRunGivesItsExitCodeOutputAndFiles) {
   for (const CliRun& c : kRuns)
     for (size_t part = 0; part < Split(c.args, ';').size(); ++part) {
       const std::string args = Split(c.args, ';')[part], err = Part(c.err, part),
-                        files = Part(c.files, part);
+                        files = Part(c.files, part), out = Part(c.out ? c.out : kFindings, part);
       SCOPED_TRACE(std::string(c.name) + ": " + args);
       NewTemp("run" + std::to_string(++n));
       if (args.find("locked") != args.npos && ::geteuid() == 0) continue;  // root reads it
       const bool targets = std::string(c.setup) == "targets";
       const std::shared_ptr<void> held = Prepare(c.setup, temp_, Company());
-      const auto before = targets ? Snapshot(temp_ / "company") : decltype(Snapshot({})){};
       company_ = targets ? temp_ / "company" : Company();
-      const RunResult r = Run(args, c.env);
+      const RunResult r = Run(args, Part(c.env, part));
       EXPECT_EQ(r.exitCode, c.exit) << r.err;
-      for (const auto& spec : Split(c.out ? c.out : kFindings, '|'))
+      for (const auto& spec : Split(out, '|'))
         EXPECT_TRUE(Matches(r.out, Expand(spec))) << spec << "\n" << r.out;
       size_t at = 0;
       for (const auto& spec : Split(err, '|')) {
@@ -324,19 +292,20 @@ TEST_F(CliTest, EveryRunGivesItsExitCodeOutputAndFiles) {
       for (const auto& file : Split(files, '|')) {
         const fs::path p = temp_ / file.substr(0, file.find(' '));
         const std::string spec = file.substr(file.find(' ') + 1);
-        struct stat st {};
         if (spec == "-") {
           EXPECT_FALSE(fs::exists(fs::symlink_status(p))) << p;
         } else if (spec.starts_with("#")) {  // "#600": and readable by its owner only
-          EXPECT_TRUE(::lstat(p.c_str(), &st) == 0 && S_ISREG(st.st_mode) &&
-                      (spec == "#" || (st.st_mode & 0777) == 0600))
+          const fs::file_status st = fs::symlink_status(p);
+          EXPECT_TRUE(
+              fs::is_regular_file(st) &&
+              (spec == "#" || st.permissions() == (fs::perms::owner_read | fs::perms::owner_write)))
               << p;
         } else {
           EXPECT_TRUE(Matches(Contents(p), spec)) << p << ": " << spec;
         }
       }
       if (targets) {
-        EXPECT_TRUE(Snapshot(temp_ / "company") == before) << "the company folder changed";
+        EXPECT_TRUE(Snapshot(temp_ / "company") == Snapshot(Company())) << "the company changed";
         EXPECT_TRUE(fs::is_directory(temp_ / "folder") && fs::is_symlink(temp_ / "link.xlsx"));
       }
       for (const auto& e : fs::directory_iterator(temp_)) {
@@ -382,7 +351,7 @@ std::vector<std::string> Between(const std::string& page, const std::string& ope
 // Regression: with addresses from the document header, the label sheet and the list printed
 // the header's name and address reversed ("12 הרצל" as "הרצל 21"), while the dispatch file
 // had them in reading order. The three outputs agree on every recipient, by accounts and by
-// documents, and hold the names the books hold.
+// documents.
 TEST_F(CliTest, DocumentAddressOnTheSheetWasReversed) {
   for (const std::string criteria :
        {"",
@@ -416,23 +385,15 @@ TEST_F(CliTest, DocumentAddressOnTheSheetWasReversed) {
     EXPECT_FALSE(onSheet.empty());
     EXPECT_EQ(onSheet, inList);
     EXPECT_EQ(onSheet, inFile);
-    size_t known = 0;  // names as the books hold them
-    for (const auto& a : truth_->accounts)
-      known += a.unambiguousText && std::find(names.begin(), names.end(), a.name) != names.end();
-    EXPECT_TRUE(known > 0 || !criteria.empty());
   }
 }
 
 // Two companies listed at once in one temporary folder: each run gives exactly the page it
 // gives alone, or is refused with the message; never a page mixed from both companies.
 TEST_F(CliTest, TwoRunsSharingATempFolderMixedTheirCompanies) {
-  zdrgen::Options options;
-  options.accounts = 4000;
-  options.documents = 0;
-  options.ledger = 30000;
-  options.keepDetail = false;
   for (int c = 0; c < 2; ++c) {
-    options.seed = 31 + c;
+    const zdrgen::Options options{
+        .seed = 31u + c, .accounts = 4000, .documents = 0, .ledger = 30000, .keepDetail = false};
     zdrgen::WriteCompany(temp_ / std::to_string(c), options, c == 0 ? "חברה א" : "חברה ב");
   }
   FakeOpener(temp_ / "bin");
@@ -449,21 +410,18 @@ TEST_F(CliTest, TwoRunsSharingATempFolderMixedTheirCompanies) {
   }
   ASSERT_NE(solo[0], solo[1]);
   for (int round = 0; round < 2; ++round) {
-    FILE* pipes[2];
-    int ids[2];
+    const auto copy = [&](int c) { return "copy" + std::to_string(round) + std::to_string(c); };
+    std::future<RunResult> runs[2];
+    for (int c = 0; c < 2; ++c)
+      runs[c] = std::async(std::launch::async, [&, c] { return Run(args(c), env(copy(c))); });
     for (int c = 0; c < 2; ++c) {
-      pipes[c] = Start(args(c), env("run" + std::to_string(round) + std::to_string(c)));
-      ids[c] = runs_;
-    }
-    for (int c = 0; c < 2; ++c) {
-      const RunResult r = Finish(pipes[c], ids[c]);
-      const fs::path copy = temp_ / ("run" + std::to_string(round) + std::to_string(c));
+      const RunResult r = runs[c].get();
       if (r.exitCode == 0) {
-        EXPECT_TRUE(ReadBytes(copy) == solo[c]) << "company " << c << " round " << round;
+        EXPECT_TRUE(ReadBytes(temp_ / copy(c)) == solo[c]) << "company " << c << " round " << round;
       } else {
         EXPECT_EQ(r.exitCode, 1);
-        EXPECT_NE(r.err.find(kBusy), std::string::npos) << r.err;
-        EXPECT_FALSE(fs::exists(copy));
+        EXPECT_NE(r.err.find("תפוסים בידי הפעלה אחרת של התוכנה"), std::string::npos) << r.err;
+        EXPECT_FALSE(fs::exists(temp_ / copy(c)));
       }
     }
   }
