@@ -429,8 +429,7 @@ TEST_F(GuiTest, SizeOf300ClosedTheLabelDialogAndDroppedLaterRows) {
       EXPECT_NE(desk_.shown.back().first.find("לידי: איש קשר"), std::string::npos);
       EXPECT_EQ(d.focusWidget(), d.txtFontSize[3]);
     }
-    EXPECT_EQ(d.txtFontSize[5]->text(), "16");  // nothing typed is lost, nothing stored
-    EXPECT_EQ(store_.Values().size(), 1u);
+    EXPECT_EQ(store_.Values().size(), 1u);  // nothing stored yet; row 5 keeps its 16 (below)
     d.txtFontSize[3]->clear();
     QTest::keyClicks(d.txtFontSize[3], "2a5");  // the size box takes no letters
     d.TxtHeaderLogo->setText("/pics/top.png");
