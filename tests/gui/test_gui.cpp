@@ -168,11 +168,12 @@ TEST_F(GuiTest, TabRanBackwardsInEveryRangeRow) {
     if (card_->focusWidget() == first) break;
     visited.push_back(card_->focusWidget());
   }
-  // Once round the whole panel, every stop once.
+  // Once round the whole panel, every stop once, the commands last.
   std::vector<QWidget*> all = Focusable(), once = visited;
   std::ranges::sort(all);
   std::ranges::sort(once);
   EXPECT_EQ(once, all);
+  EXPECT_EQ(visited.back()->objectName(), "CmdConnect");
   // Reading order within a group: the next stop is on the same line further left, or lower.
   for (size_t i = 1; i < visited.size(); ++i) {
     QWidget *a = visited[i - 1], *b = visited[i];
