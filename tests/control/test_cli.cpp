@@ -55,11 +55,11 @@ std::string Contents(const fs::path& p) {
 }
 
 // "=x": exactly x; "^x": starts with x; "!x": does not hold x; else holds x.
-bool Matches(const std::string& text, const std::string& spec) {
-  if (spec.starts_with("=")) return text == spec.substr(1);
-  if (spec.starts_with("^")) return text.starts_with(spec.substr(1));
-  if (spec.starts_with("!")) return text.find(spec.substr(1)) == std::string::npos;
-  return text.find(spec) != std::string::npos;
+bool Matches(const std::string& text, const std::string& pattern) {
+  if (pattern.starts_with("=")) return text == pattern.substr(1);
+  if (pattern.starts_with("^")) return text.starts_with(pattern.substr(1));
+  if (pattern.starts_with("!")) return text.find(pattern.substr(1)) == std::string::npos;
+  return text.find(pattern) != std::string::npos;
 }
 
 class CliTest : public ::testing::Test {
@@ -137,8 +137,8 @@ std::string Part(const std::string& text, size_t part) {
 
 // One run, or several split at ';' that end alike (or with an out, err, files and env part
 // each). Args are split at blanks, "@cmd" standing for cmd --company {C} --settings {S}; `out`
-// and `err` hold specs for Matches split at '|', the err ones found in order; `files` holds
-// "name spec" pairs split at '|' for files in the temporary folder, the spec "-" for no such
+// and `err` hold patterns for Matches split at '|', the err ones found in order; `files` holds
+// "name pattern" pairs split at '|' for files in the temporary folder, the pattern "-" for no such
 // file and "#" for a file of its own (not a link). `setup` names what the folder holds before
 // the run.
 struct CliRun {
@@ -282,26 +282,27 @@ TEST_F(CliTest, EveryRunGivesItsExitCodeOutputAndFiles) {
       company_ = targets ? temp_ / "company" : Company();
       const RunResult r = Run(args, Part(c.env, part));
       EXPECT_EQ(r.exitCode, c.exit) << r.err;
-      for (const auto& spec : Split(out, '|'))
-        EXPECT_TRUE(Matches(r.out, Expand(spec))) << spec << "\n" << r.out;
+      for (const auto& pattern : Split(out, '|'))
+        EXPECT_TRUE(Matches(r.out, Expand(pattern))) << pattern << "\n" << r.out;
       size_t at = 0;
-      for (const auto& spec : Split(err, '|')) {
-        EXPECT_TRUE(Matches(r.err.substr(spec.starts_with("!") ? 0 : at), spec)) << spec << r.err;
-        if (!spec.starts_with("!")) at = std::min(r.err.size(), r.err.find(spec, at));
+      for (const auto& pattern : Split(err, '|')) {
+        EXPECT_TRUE(Matches(r.err.substr(pattern.starts_with("!") ? 0 : at), pattern))
+            << pattern << r.err;
+        if (!pattern.starts_with("!")) at = std::min(r.err.size(), r.err.find(pattern, at));
       }
       for (const auto& file : Split(files, '|')) {
         const fs::path p = temp_ / file.substr(0, file.find(' '));
-        const std::string spec = file.substr(file.find(' ') + 1);
-        if (spec == "-") {
+        const std::string pattern = file.substr(file.find(' ') + 1);
+        if (pattern == "-") {
           EXPECT_FALSE(fs::exists(fs::symlink_status(p))) << p;
-        } else if (spec.starts_with("#")) {  // "#600": and readable by its owner only
+        } else if (pattern.starts_with("#")) {  // "#600": and readable by its owner only
           const fs::file_status st = fs::symlink_status(p);
-          EXPECT_TRUE(
-              fs::is_regular_file(st) &&
-              (spec == "#" || st.permissions() == (fs::perms::owner_read | fs::perms::owner_write)))
+          EXPECT_TRUE(fs::is_regular_file(st) &&
+                      (pattern == "#" ||
+                       st.permissions() == (fs::perms::owner_read | fs::perms::owner_write)))
               << p;
         } else {
-          EXPECT_TRUE(Matches(Contents(p), spec)) << p << ": " << spec;
+          EXPECT_TRUE(Matches(Contents(p), pattern)) << p << ": " << pattern;
         }
       }
       if (targets) {
