@@ -10,6 +10,7 @@
 #include <string>
 #include <vector>
 
+#include "common/value.h"
 #include "engine/engine.h"
 
 namespace zdr::db {
@@ -69,17 +70,6 @@ bool EqualsNoCase(std::string_view a, std::string_view b) {
   return true;
 }
 
-// Days from 30 December 1899 to the given civil date (proleptic Gregorian).
-int64_t DateSerial(int64_t y, int64_t m, int64_t d) {
-  y -= m <= 2;
-  const int64_t era = (y >= 0 ? y : y - 399) / 400;
-  const int64_t yoe = y - era * 400;
-  const int64_t doy = (153 * (m + (m > 2 ? -3 : 9)) + 2) / 5 + d - 1;
-  const int64_t doe = yoe * 365 + yoe / 4 - yoe / 100 + doy;
-  const int64_t daysSince1970 = era * 146097 + doe - 719468;
-  return daysSince1970 + 25569;
-}
-
 bool IsLeap(int64_t y) {
   return (y % 4 == 0 && y % 100 != 0) || y % 400 == 0;
 }
@@ -119,7 +109,8 @@ std::string DateLiteral(std::string_view body, size_t pos) {
   if (m < 1 || m > 12 || d < 1 || d > DaysInMonth(y, m) || y < 100) {
     FailAt("תאריך לא תקין #" + std::string(body) + "#", pos);
   }
-  return std::to_string(DateSerial(y, m, d));
+  return std::to_string(
+      Date::FromParts(static_cast<int>(y), static_cast<int>(m), static_cast<int>(d)).serial);
 }
 
 std::vector<Token> Tokenize(std::string_view s) {
