@@ -6,7 +6,7 @@ set -euo pipefail
 PACKAGES=(
   build-essential cmake ninja-build pkg-config clang-format
   libicu-dev libsqlite3-dev qt6-base-dev qt6-translations-l10n libxlsxwriter-dev
-  libcairo2-dev libpango1.0-dev
+  libcairo2-dev libpango1.0-dev libgdk-pixbuf-2.0-dev libexpat1-dev glabels-data
   libgtest-dev libgmock-dev libbenchmark-dev
   culmus fonts-dejavu-core
   chromium poppler-utils python3-openpyxl

@@ -29,10 +29,14 @@ const char* const kUsage =
     "usage: zdrlab labels|list|post [--company DIR] [--settings FILE] [--set NAME=VALUE]... "
     "[--open] [--times]\n"
     "       zdrlab post [--check] [--strict] ...\n"
-    "       zdrlab labels --pdf FILE [--template ID] [--offset X,Y] [options as above]\n"
-    "       zdrlab calibrate --pdf FILE [--template ID] [--offset X,Y] [--settings FILE]\n"
+    "       zdrlab labels --pdf FILE [--template ID] [--offset X,Y] [--scale X,Y] [options as "
+    "above]\n"
+    "       zdrlab calibrate --pdf FILE [--template ID] [--offset X,Y] [--scale X,Y] [--settings "
+    "FILE]\n"
     "  labels  the label sheet zdrlab1.htm; with --pdf, the sheet as PDF on label stock ID\n"
-    "          (default: the stock the settings keep, a4-3x8-70x37), moved by X,Y mm\n"
+    "          (default: the stock the settings keep, a4-3x8-70x37; or a catalogue stock by\n"
+    "          brand and part, \"Avery L7160\"), moved by X,Y mm and grown by X,Y per mille\n"
+    "          (given, they replace the kept correction; a part not given is 0)\n"
     "  calibrate  the calibration page of a label stock as PDF\n"
     "  (each option's value may also follow an equals sign: --set=NAME=VALUE)\n"
     "  list    the address list zdrlab2.htm\n"
@@ -211,7 +215,7 @@ int RunCli(const std::vector<std::string>& args, SettingsStore& defaultStore) {
   std::vector<std::pair<std::string, std::string>> sets;
   bool open = false, check = false, strict = false, times = false;
   std::optional<std::string> pdf, stockId;
-  std::optional<StockOffset> offset;
+  std::optional<StockOffset> offset, scale;
   for (size_t i = 1; i < args.size(); ++i) {
     // "--name=value" is "--name value".
     std::string a = args[i];
@@ -253,6 +257,12 @@ int RunCli(const std::vector<std::string>& args, SettingsStore& defaultStore) {
         if (!offset)
           throw std::invalid_argument(
               "--offset takes X,Y in mm, each -10 to 10 in steps of 0.1, not " + xy);
+      } else if (a == "--scale" && (command == "labels" || command == "calibrate")) {
+        const std::string& xy = needValue("--scale");
+        scale = ParseStockScale(xy);
+        if (!scale)
+          throw std::invalid_argument(
+              "--scale takes X,Y per mille, each -100 to 100 in steps of 0.1, not " + xy);
       } else if (a == "--times" && !inlineValue) {
         times = true;
       } else {
@@ -275,8 +285,8 @@ int RunCli(const std::vector<std::string>& args, SettingsStore& defaultStore) {
     std::fprintf(stderr, "zdrlab: calibrate needs --pdf FILE\n%s", kUsage);
     return 2;
   }
-  if ((stockId || offset) && !pdf) {
-    std::fprintf(stderr, "zdrlab: --template and --offset go with --pdf FILE\n%s", kUsage);
+  if ((stockId || offset || scale) && !pdf) {
+    std::fprintf(stderr, "zdrlab: --template, --offset and --scale go with --pdf FILE\n%s", kUsage);
     return 2;
   }
 
@@ -304,11 +314,17 @@ int RunCli(const std::vector<std::string>& args, SettingsStore& defaultStore) {
     return strict && control.lastPreflight().errors > 0 ? 3 : 0;
   }
   if (stockId && !FindLabelStock(store, *stockId)) {
+    // The shipped and the user's stocks are named; the catalogue's are too many to list.
     std::string known;
     for (const LabelStock& s : AvailableLabelStocks(store)) known += " " + s.id;
-    std::fprintf(stderr, "zdrlab: unknown label stock %s; known:%s\n", stockId->c_str(),
-                 known.c_str());
+    std::fprintf(stderr, "zdrlab: %s. התבניות:%s, ותבניות הקטלוג לפי יצרן ומק\"ט\n",
+                 LabelStockLookupProblem(store, *stockId).c_str(), known.c_str());
     return 2;
+  }
+  if (scale) {
+    if (!offset) offset = StockOffset{};
+    offset->scaleX = scale->scaleX;
+    offset->scaleY = scale->scaleY;
   }
 
   std::string produced;

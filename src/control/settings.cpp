@@ -9,6 +9,7 @@
 #include <string>
 #include <utility>
 
+#include "control/stockcatalogue.h"
 #include "hostfile/doctypes.h"
 
 namespace zdr {
@@ -333,7 +334,8 @@ std::optional<LabelStock> LoadUserStock(SettingsStore& store, const std::string&
   if (!rows || !cols) return std::nullopt;
   s.rows = static_cast<int>(*rows);
   s.cols = static_cast<int>(*cols);
-  if (!LabelStockProblem(s).empty() || FindShippedStock(s.id)) return std::nullopt;
+  if (!UserStockIdProblem(s.id).empty() || !LabelStockProblem(s).empty() || FindShippedStock(s.id))
+    return std::nullopt;
   return s;
 }
 
@@ -343,6 +345,12 @@ std::optional<double> LoadOffsetMm(SettingsStore& store, std::string_view sectio
   return v ? CheckedOffsetMm(*v) : std::nullopt;
 }
 
+std::optional<double> LoadScalePerMille(SettingsStore& store, std::string_view section,
+                                        std::string_view key) {
+  const auto v = ParseMm(store.Get(kSettingsApp, section, key, "0"));
+  return v ? CheckedScalePerMille(*v) : std::nullopt;
+}
+
 }  // namespace
 
 void SetGetRegLabelPdf(uint8_t action, SettingsStore& store, LabelPdfSettings& pdf) {
@@ -350,6 +358,8 @@ void SetGetRegLabelPdf(uint8_t action, SettingsStore& store, LabelPdfSettings& p
     SaveValue(store, kLabelPdfSection, "Template", pdf.Template);
     SaveValue(store, kLabelPdfSection, "OffsetX", FormatMm(pdf.Offset.x));
     SaveValue(store, kLabelPdfSection, "OffsetY", FormatMm(pdf.Offset.y));
+    SaveValue(store, kLabelPdfSection, "ScaleX", FormatMm(pdf.Offset.scaleX));
+    SaveValue(store, kLabelPdfSection, "ScaleY", FormatMm(pdf.Offset.scaleY));
     SaveValue(store, kLabelPdfSection, "Output", std::to_string(pdf.Output));
   } else if (action == kActionLoad) {
     IgnoringErrors([&] {
@@ -361,6 +371,14 @@ void SetGetRegLabelPdf(uint8_t action, SettingsStore& store, LabelPdfSettings& p
     });
     IgnoringErrors([&] {
       if (const auto y = LoadOffsetMm(store, kLabelPdfSection, "OffsetY", "0")) pdf.Offset.y = *y;
+    });
+    IgnoringErrors([&] {
+      if (const auto v = LoadScalePerMille(store, kLabelPdfSection, "ScaleX"))
+        pdf.Offset.scaleX = *v;
+    });
+    IgnoringErrors([&] {
+      if (const auto v = LoadScalePerMille(store, kLabelPdfSection, "ScaleY"))
+        pdf.Offset.scaleY = *v;
     });
     IgnoringErrors([&] {
       const auto v = ParseInRange(store.Get(kSettingsApp, kLabelPdfSection, "Output", "0"), 0, 1);
@@ -378,7 +396,8 @@ std::vector<LabelStock> LoadUserStocks(SettingsStore& store) {
 }
 
 void SaveUserStock(SettingsStore& store, const LabelStock& stock) {
-  const std::string problem = LabelStockProblem(stock);
+  std::string problem = UserStockIdProblem(stock.id);
+  if (problem.empty()) problem = LabelStockProblem(stock);
   if (!problem.empty()) throw std::invalid_argument(problem);
   if (FindShippedStock(stock.id))
     throw std::invalid_argument("השם " + stock.id + " שמור לתבנית מובנית; בחרו שם אחר");
@@ -422,7 +441,23 @@ std::optional<LabelStock> FindLabelStock(SettingsStore& store, std::string_view 
   for (const std::string& user : UserStockIds(store)) {
     if (user == id) return LoadUserStock(store, user);
   }
+  if (const CatalogueEntry* e = InstalledStockCatalogue().Find(id)) return e->stock;
   return std::nullopt;
+}
+
+std::string LabelStockLookupProblem(SettingsStore& store, std::string_view id) {
+  if (FindLabelStock(store, id)) return "";
+  if (const CatalogueEntry* e = InstalledStockCatalogue().Find(id)) {
+    return "את תבנית המדבקות \"" + std::string(id) + "\" לא ניתן להדפיס: " + e->problem;
+  }
+  for (const std::string& user : UserStockIds(store)) {
+    if (user != id) continue;
+    // A stock of the user's own whose stored figures are spoilt: say which check fails.
+    std::string problem = UserStockIdProblem(id);
+    if (problem.empty()) problem = "הערכים השמורים שלה חסרים או אינם תקינים";
+    return "את תבנית המדבקות \"" + std::string(id) + "\" לא ניתן להדפיס: " + problem;
+  }
+  return "תבנית המדבקות \"" + std::string(id) + "\" אינה מוכרת";
 }
 
 std::optional<StockOffset> LoadStockOffset(SettingsStore& store, std::string_view id) {
@@ -430,7 +465,10 @@ std::optional<StockOffset> LoadStockOffset(SettingsStore& store, std::string_vie
   const auto x = LoadOffsetMm(store, section, "OffsetX", "");
   const auto y = LoadOffsetMm(store, section, "OffsetY", "");
   if (!x || !y) return std::nullopt;
-  return StockOffset{*x, *y};
+  // Kept before the scales were: no scale.
+  const auto scaleX = LoadScalePerMille(store, section, "ScaleX");
+  const auto scaleY = LoadScalePerMille(store, section, "ScaleY");
+  return StockOffset{*x, *y, scaleX.value_or(0), scaleY.value_or(0)};
 }
 
 void SaveStockOffset(SettingsStore& store, std::string_view id,
@@ -439,12 +477,18 @@ void SaveStockOffset(SettingsStore& store, std::string_view id,
   if (!offset) {
     store.Save(kSettingsApp, section, "OffsetX", "");
     store.Save(kSettingsApp, section, "OffsetY", "");
+    store.Save(kSettingsApp, section, "ScaleX", "");
+    store.Save(kSettingsApp, section, "ScaleY", "");
     return;
   }
   if (!CheckedOffsetMm(offset->x) || !CheckedOffsetMm(offset->y))
     throw std::invalid_argument("ההיסט חייב להיות בין -10 ל-10 מ\"מ, בצעדים של 0.1");
+  if (!CheckedScalePerMille(offset->scaleX) || !CheckedScalePerMille(offset->scaleY))
+    throw std::invalid_argument("תיקון קנה המידה חייב להיות בין -100 ל-100 פרומיל, בצעדים של 0.1");
   store.Save(kSettingsApp, section, "OffsetX", FormatMm(offset->x));
   store.Save(kSettingsApp, section, "OffsetY", FormatMm(offset->y));
+  store.Save(kSettingsApp, section, "ScaleX", FormatMm(offset->scaleX));
+  store.Save(kSettingsApp, section, "ScaleY", FormatMm(offset->scaleY));
 }
 
 StockOffset EffectiveStockOffset(SettingsStore& store, const LabelPdfSettings& pdf,

@@ -168,9 +168,10 @@ void SetGetRegLabelDefs(uint8_t action, SettingsStore& store, LabelSettings& lab
 void SetGetRegPostILDefs(uint8_t action, SettingsStore& store, PostILSettings& postIL);
 
 // Saves or loads how the label command prints: section LabelPdf, keys Template (default
-// a4-3x8-70x37), OffsetX and OffsetY (millimetres, default 0) and Output (0 the HTML
-// sheet, 1 the PDF). Errors are ignored value by value: an offset that is not a number
-// within +-10 on a step of 0.1, or an output other than 0 or 1, leaves the old value.
+// a4-3x8-70x37), OffsetX and OffsetY (millimetres, default 0), ScaleX and ScaleY (per
+// mille, default 0) and Output (0 the HTML sheet, 1 the PDF). Errors are ignored value by
+// value: an offset that is not a number within +-10 on a step of 0.1, a scale not within
+// +-100 on a step of 0.1, or an output other than 0 or 1, leaves the old value.
 void SetGetRegLabelPdf(uint8_t action, SettingsStore& store, LabelPdfSettings& pdf);
 
 // The user's own label stocks. Section LabelStocks, key Ids lists their ids separated by
@@ -181,8 +182,8 @@ void SetGetRegLabelPdf(uint8_t action, SettingsStore& store, LabelPdfSettings& p
 std::vector<LabelStock> LoadUserStocks(SettingsStore& store);
 
 // Adds or replaces a user stock. Throws std::invalid_argument (Hebrew) for a stock that
-// LabelStockProblem refuses or that takes a shipped stock's id; SettingsStoreError when
-// the store cannot be written.
+// UserStockIdProblem or LabelStockProblem refuses or that takes a shipped stock's id;
+// SettingsStoreError when the store cannot be written.
 void SaveUserStock(SettingsStore& store, const LabelStock& stock);
 
 // Drops a user stock from the list (its values stay behind, unused).
@@ -191,15 +192,22 @@ void RemoveUserStock(SettingsStore& store, std::string_view id);
 // The shipped stocks, then the user's.
 std::vector<LabelStock> AvailableLabelStocks(SettingsStore& store);
 
-// The stock named `id` among AvailableLabelStocks, or nothing.
+// The stock named `id` among AvailableLabelStocks, a retired shipped stock, or a stock of
+// the installed catalogue that can be printed ("Avery L7160"); nothing otherwise.
 std::optional<LabelStock> FindLabelStock(SettingsStore& store, std::string_view id);
 
-// A stock's own offset (keys OffsetX and OffsetY of section "LabelStock." + id), when both
-// are kept and valid.
+// Why FindLabelStock finds nothing for `id` (a Hebrew sentence naming it): unknown, the
+// catalogue's reason it cannot be printed, or a spoilt stock of the user's. Empty when it
+// finds one.
+std::string LabelStockLookupProblem(SettingsStore& store, std::string_view id);
+
+// A stock's own correction (keys OffsetX, OffsetY, ScaleX and ScaleY of section
+// "LabelStock." + id), when both offsets are kept and valid; a scale missing or not valid
+// counts as 0.
 std::optional<StockOffset> LoadStockOffset(SettingsStore& store, std::string_view id);
 
-// Keeps a stock's own offset, or with nothing clears it (empty values). Throws
-// std::invalid_argument for an invalid offset, SettingsStoreError when the store cannot be
+// Keeps a stock's own correction, or with nothing clears it (empty values). Throws
+// std::invalid_argument for an invalid offset or scale, SettingsStoreError when the store cannot be
 // written.
 void SaveStockOffset(SettingsStore& store, std::string_view id,
                      const std::optional<StockOffset>& offset);

@@ -18,10 +18,16 @@ struct StockChoice {
 };
 
 StockChoice ChooseStock(SettingsStore& store, const LabelPdfSettings& pdf,
-                        const std::string& stockId, const std::optional<StockOffset>& offset) {
+                        const std::string& stockId, const std::optional<StockOffset>& offset,
+                        UserSeam& ui) {
   const std::string id = stockId.empty() ? pdf.Template : stockId;
   std::optional<LabelStock> stock = FindLabelStock(store, id);
-  if (!stock) throw std::runtime_error("תבנית המדבקות \"" + id + "\" אינה מוכרת");
+  if (!stock) throw std::runtime_error(LabelStockLookupProblem(store, id));
+  if (IsRetiredStock(stock->id)) {
+    ui.SetStatus("תבנית המדבקות " + stock->id +
+                 " אינה לפי גיליון מפורסם ואינה מוצעת עוד; היא מודפסת כבעבר. מומלץ לבחור "
+                 "תבנית אחרת בהגדרות המדבקה");
+  }
   return {*stock, offset ? *offset : EffectiveStockOffset(store, pdf, stock->id)};
 }
 
@@ -35,7 +41,7 @@ void OpenPdf(UserSeam& ui, const std::string& path) {
 std::string Control::CmdLabPdf(const std::string& path, const std::string& stockId,
                                std::optional<StockOffset> offset) {
   try {
-    const StockChoice choice = ChooseStock(store_, labelPdf_, stockId, offset);
+    const StockChoice choice = ChooseStock(store_, labelPdf_, stockId, offset, ui_);
     // The data load rebuilds the temporary folder's working database: no other run may.
     const auto lock = LockWorkFiles();
     ReadAllData(true);
@@ -55,7 +61,7 @@ std::string Control::CmdLabPdf(const std::string& path, const std::string& stock
 std::string Control::CmdCalibrate(const std::string& path, const std::string& stockId,
                                   std::optional<StockOffset> offset) {
   try {
-    const StockChoice choice = ChooseStock(store_, labelPdf_, stockId, offset);
+    const StockChoice choice = ChooseStock(store_, labelPdf_, stockId, offset, ui_);
     CreateCalibrationPdf(path, choice.stock, choice.offset);
     OpenPdf(ui_, path);
     return path;

@@ -84,9 +84,11 @@ class CliTest : public ::testing::Test {
   static fs::path Company() { return scratch_->dir() / "company"; }
   fs::path company_ = Company();  // what {C} stands for
 
-  // `text` with {C} the company folder, {S} the settings file and {T} the temporary folder.
+  // `text` with {C} the company folder, {S} the settings file, {T} the temporary folder and
+  // {_} a blank within one argument.
   std::string Expand(std::string text) const {
-    for (const auto& [from, to] : {std::pair{"{C}", company_}, {"{S}", settings_}, {"{T}", temp_}})
+    for (const auto& [from, to] :
+         {std::pair{"{C}", company_}, {"{S}", settings_}, {"{T}", temp_}, {"{_}", fs::path(" ")}})
       for (size_t at = text.find(from); at != std::string::npos; at = text.find(from, at))
         text.replace(at, 3, to.string());
     return text;
@@ -197,6 +199,13 @@ const CliRun kRuns[] = {
      "calibrate --settings {S} --pdf {T}/calibration.pdf",
      0, "={T}/labels.pdf\n;={T}/calibration.pdf\n", "",
      "labels.pdf ^%PDF-|zdrlab1.htm -;calibration.pdf ^%PDF-"},
+    {"CatalogueStockByBrandAndPart",
+     "@labels --set UseTitle1=1 --pdf {T}/l.pdf --template Avery{_}L7160 --scale 15.2,-3", 0,
+     "={T}/l.pdf\n", "", "l.pdf ^%PDF-"},
+    {"StockThatCannotBePrintedSaysWhy",
+     "calibrate --settings {S} --pdf {T}/c.pdf --template Avery{_}L6015;"
+     "calibrate --settings {S} --pdf {T}/c.pdf --scale 100.5,0",
+     2, "", "מדבקות תקליטור;--scale", "c.pdf -"},
     {"SettingsThatAskForThePdfGiveIt", "@labels", 0, "={T}/zdrlab1.pdf\n", "", "zdrlab1.pdf ^%PDF-",
      "", "pdfsettings"},
     {"PdfOptionsAreChecked",

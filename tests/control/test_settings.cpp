@@ -174,7 +174,8 @@ TEST(LabelDefsTest, FreshStoreRoundTripAndUnreadableValues) {
   for (auto& line : labels.LabelDefs) line = LabelLineDef{2, 20, 2, 1, 1};
   labels.LabPics = {"top.gif", "bottom.gif"};
   SetGetRegLabelDefs(kActionLoad, store, labels);
-  for (int i = 0; i <= 7; ++i) EXPECT_EQ(Fields(labels.LabelDefs[i]), Fields({0, 9, 0, 0, 0}));
+  for (int i = 0; i <= 7; ++i)
+    EXPECT_EQ(Fields(labels.LabelDefs[i]), Fields(LabelLineDef{0, 9, 0, 0, 0}));
   EXPECT_EQ(labels.LabelDefs[8].FontSize, 20) << "line 8 is not moved";
   EXPECT_EQ(labels.LabPics, (std::array<std::string, 2>{}));
 
@@ -253,65 +254,18 @@ TEST(QtStoreTest, ValuesAndThePanelComeBackFromTheFile) {
   EXPECT_EQ(fs::path(QtSettingsStore().Location()).parent_path(), dir / "ZDRLab");
 }
 
-// ---- Label stock, the PDF's settings and the user's stocks ---------------------------
-
-TEST(LabelStockTest, ShippedStocksAreSoundAndCountRightToLeft) {
-  const auto& stocks = ShippedLabelStocks();
-  ASSERT_GE(stocks.size(), 8u);
-  EXPECT_EQ(stocks[0].id, kDefaultStockId);
-  std::set<std::string> ids;
-  for (const LabelStock& s : stocks) {
-    EXPECT_EQ(LabelStockProblem(s), "") << s.id;
-    EXPECT_TRUE(ids.insert(s.id).second) << s.id;
-  }
-  // Position 1 is the top row's rightmost label; the next row starts at the right again.
-  const LabelStock s = *FindShippedStock("a4-2x7-99.1x38.1");
-  EXPECT_DOUBLE_EQ(StockLabelBox(s, 1).x, 4.65 + 101.6);
-  EXPECT_DOUBLE_EQ(StockLabelBox(s, 2).x, 4.65);
-  EXPECT_DOUBLE_EQ(StockLabelBox(s, 3).y, 15.15 + 38.1);
-  EXPECT_DOUBLE_EQ(StockLabelBox(s, 3, {1, -2}).y, 15.15 + 38.1 - 2);
-
-  const std::vector<std::pair<const char*, std::function<void(LabelStock&)>>> spoilt = {
-      {"empty id", [](LabelStock& s) { s.id = ""; }},
-      {"id with a blank", [](LabelStock& s) { s.id = "my stock"; }},
-      {"no rows", [](LabelStock& s) { s.rows = 0; }},
-      {"label wider than its pitch", [](LabelStock& s) { s.labelWidth = 71; }},
-      {"off the page", [](LabelStock& s) { s.top = 2; }},
-      {"padding fills the label", [](LabelStock& s) { s.padding = 18.5; }},
-      {"negative margin", [](LabelStock& s) { s.side = -1; }},
-      {"not a number", [](LabelStock& s) { s.pitchY = std::nan(""); }},
-  };
-  for (const auto& [name, spoil] : spoilt) {
-    LabelStock bad = stocks[0];
-    spoil(bad);
-    EXPECT_NE(LabelStockProblem(bad), "") << name;
-  }
-}
-
-// Offsets as typed, each followed by how it reads back ("-" when refused).
-TEST(LabelStockTest, OffsetsAreTenthsWithinTenMillimetres) {
-  const char* cases[] = {"0,0",    "0,0",   "1.5,-0.3", "1.5,-0.3", " 10 , -10 ", "10,-10",
-                         "+0.1,0", "0.1,0", "10.1,0",   "-",        "0.05,0",     "-",
-                         "1;2",    "-",     "1,",       "-",        "a,b",        "-",
-                         "1,2,3",  "-",     "1e1,0",    "-",        "nan,0",      "-"};
-  for (size_t i = 0; i < std::size(cases); i += 2) {
-    const auto o = ParseStockOffset(cases[i]);
-    EXPECT_EQ(o ? FormatMm(o->x) + "," + FormatMm(o->y) : "-", cases[i + 1]) << cases[i];
-  }
-  EXPECT_EQ(CheckedOffsetMm(0.1 + 0.2), 0.3);
-  EXPECT_EQ(FormatMm(-0.0) + " " + FormatMm(99.1) + " " + FormatMm(70), "0 99.1 70");
-}
+// ---- The PDF's settings and the user's stocks (the stocks themselves: test_labelstock) ---
 
 TEST(LabelPdfTest, FreshStoreRoundTripAndUnreadableValues) {
   MemorySettingsStore store;
   LabelPdfSettings pdf{"x", {1, 1}, 1};
   SetGetRegLabelPdf(kActionLoad, store, pdf);
   EXPECT_EQ(Fields(pdf), Fields(LabelPdfSettings{}));  // the default stock, no offset, HTML
-  LabelPdfSettings saved{"a4-2x4-105x74", {-1.2, 0.7}, 1}, loaded;
+  LabelPdfSettings saved{"Avery L7160", {-1.2, 0.7, 15.2, -0.4}, 1}, loaded;
   SetGetRegLabelPdf(kActionSave, store, saved);
   SetGetRegLabelPdf(kActionLoad, store, loaded);
   EXPECT_EQ(Fields(loaded), Fields(saved));
-  for (const auto& [key, value] : Pairs("OffsetX=12 OffsetY=0,5 Output=2"))
+  for (const auto& [key, value] : Pairs("OffsetX=12 OffsetY=0,5 ScaleX=100.1 ScaleY=0.05 Output=2"))
     store.Save(kSettingsApp, kLabelPdfSection, key, value);
   SetGetRegLabelPdf(kActionLoad, store, loaded);
   EXPECT_EQ(Fields(loaded), Fields(saved));
@@ -319,31 +273,38 @@ TEST(LabelPdfTest, FreshStoreRoundTripAndUnreadableValues) {
 
 TEST(UserStockTest, SavedStocksComeBackAndAnOwnOffsetWinsOverTheUsers) {
   MemorySettingsStore store;
-  LabelStock mine = *FindShippedStock("letter-3x10-66.7x25.4");  // no size at its default
-  mine.id = "office-2x5";
+  LabelStock mine = *FindShippedStock("a4-2x7-99.1x38.1");  // no size at its default
+  mine.id = "office-1x7";
   mine.name = "מדבקות המשרד";
-  mine.cols = 2;
+  mine.source.clear();  // the user's own follows no published sheet
+  mine.cols = 1;
   SaveUserStock(store, mine);
   SaveUserStock(store, mine);  // again: listed once
   EXPECT_EQ(LoadUserStocks(store), std::vector<LabelStock>{mine});
-  EXPECT_EQ(*FindLabelStock(store, "office-2x5"), mine);
+  EXPECT_EQ(*FindLabelStock(store, "office-1x7"), mine);
   EXPECT_EQ(AvailableLabelStocks(store).size(), ShippedLabelStocks().size() + 1);
 
   LabelPdfSettings pdf;
   pdf.Offset = {0.5, 0.5};
   EXPECT_EQ(EffectiveStockOffset(store, pdf, mine.id), pdf.Offset);
-  SaveStockOffset(store, mine.id, StockOffset{-2, 1.1});
-  EXPECT_EQ(EffectiveStockOffset(store, pdf, mine.id), (StockOffset{-2, 1.1}));
+  SaveStockOffset(store, mine.id, StockOffset{-2, 1.1, -15.2, 3});
+  EXPECT_EQ(EffectiveStockOffset(store, pdf, mine.id), (StockOffset{-2, 1.1, -15.2, 3}));
+  // Kept before there were scales: no scale.
+  store.Save(kSettingsApp, "LabelStock.office-1x7", "ScaleX", "");
+  EXPECT_EQ(EffectiveStockOffset(store, pdf, mine.id), (StockOffset{-2, 1.1, 0, 3}));
   EXPECT_EQ(EffectiveStockOffset(store, pdf, kDefaultStockId), pdf.Offset);
   SaveStockOffset(store, mine.id, std::nullopt);
   EXPECT_EQ(EffectiveStockOffset(store, pdf, mine.id), pdf.Offset);
   EXPECT_THROW(SaveStockOffset(store, mine.id, StockOffset{11, 0}), std::invalid_argument);
+  EXPECT_THROW(SaveStockOffset(store, mine.id, StockOffset{0, 0, 0, 100.5}), std::invalid_argument);
   RemoveUserStock(store, mine.id);
   EXPECT_TRUE(LoadUserStocks(store).empty());
 
   // Shipped ids and unsound stocks are refused; a spoilt stored stock is left out.
   store.ClearLog();
   LabelStock shipped = *FindShippedStock(kDefaultStockId);
+  EXPECT_THROW(SaveUserStock(store, shipped), std::invalid_argument);
+  shipped.id = "my stock";  // a catalogue's kind of name, not one of the user's
   EXPECT_THROW(SaveUserStock(store, shipped), std::invalid_argument);
   shipped.id = "wide";
   shipped.labelWidth = 80;
@@ -354,6 +315,8 @@ TEST(UserStockTest, SavedStocksComeBackAndAnOwnOffsetWinsOverTheUsers) {
   store.Save(kSettingsApp, "LabelStock.wide", "Rows", "many");
   EXPECT_TRUE(LoadUserStocks(store).empty());
   EXPECT_FALSE(FindLabelStock(store, "wide"));
+  EXPECT_EQ(LabelStockLookupProblem(store, "wide"),
+            "את תבנית המדבקות \"wide\" לא ניתן להדפיס: הערכים השמורים שלה חסרים או אינם תקינים");
 }
 
 }  // namespace
