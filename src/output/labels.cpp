@@ -1,8 +1,12 @@
 // The label sheet: one full-height table of rows x columns label cells per printed page,
 // each recipient filling `copies` consecutive cells from the start position on.
 #include <algorithm>
+#include <iterator>
+#include <string>
+#include <vector>
 
 #include "output/outputinternal.h"
+#include "output/picture.h"
 #include "select/select.h"
 
 #include "engine/engine.h"
@@ -98,11 +102,154 @@ void AppendLineText(const db::Value& v, std::string& out) {
   }
 }
 
+// ---- Whether the chosen lines fit a row of the sheet --------------------------------------
+//
+// The page rules give every label its row's height and cut what overflows it; once a label
+// is taller than its row, a browser lays it from the top, so its last lines are lost. A
+// text line takes 1.1 times its font size and the cell padding, a pixel above and below;
+// the key line's outer cell is at least the page's own 12 points; a picture its height in
+// pixels. A line counts as cut when more than its leading and padding is lost (its glyphs
+// stand in the middle of its height). The sheet's bytes stay as they are: the command says
+// which lines are cut before the page opens.
+
+// What decides whether a line holds anything on a label.
+enum class LineContent { kAlways, kName, kKey, kDetails, kAddress, kDistrict, kCityZip, kPhone };
+
+struct FitLine {
+  std::string caption;
+  double heightPt;
+  LineContent content;
+  double slackPt;  // how much of its bottom may be lost with nothing visible
+};
+
+struct Paper {
+  const char* name;
+  double heightMm;
+};
+constexpr Paper kPapers[] = {{"A4", 297}, {"Letter", 279.4}};
+
+std::vector<FitLine> ChosenLines(const Panel& panel, const LabelSettings& labels) {
+  auto on = [&](int i) { return Panel::On(panel.ChkTitle[i]); };
+  auto text = [&](int style) { return 1.1 * labels.LabelDefs[style].FontSize + 1.5; };
+  auto slack = [&](int style) { return 0.15 * labels.LabelDefs[style].FontSize + 0.75; };
+  auto picture = [&](int i) {
+    int w = 0, h = 0;
+    std::string problem;
+    // A picture that cannot be read shows as a small broken-picture mark.
+    if (!output_internal::ReadLabelPictureSize(labels.LabPics[i], w, h, problem)) h = 16;
+    return std::max(h + 2, 16) * 0.75;
+  };
+  std::vector<FitLine> lines;
+  if (Panel::On(panel.ChkLogo[0]))
+    lines.push_back({"התמונה העליונה", picture(0), LineContent::kAlways, 0.75});
+  if (on(0)) lines.push_back({"לכבוד", text(0), LineContent::kAlways, slack(0)});
+  if (on(1)) lines.push_back({"שם כרטיס", text(1), LineContent::kName, slack(1)});
+  if (on(2)) {
+    const double key = std::max(1.1 * 12, 1.1 * labels.LabelDefs[2].FontSize) + 1.5;
+    lines.push_back({"קוד כרטיס", key, LineContent::kKey, slack(2)});
+  }
+  if (on(3)) lines.push_back({"איש קשר", text(3), LineContent::kDetails, slack(3)});
+  if (on(4)) lines.push_back({"כתובת", text(4), LineContent::kAddress, slack(4)});
+  if (on(6)) lines.push_back({"שכונה", text(6), LineContent::kDistrict, slack(6)});
+  if (on(5) || on(8)) {
+    lines.push_back({on(5) && on(8) ? "עיר ומיקוד"
+                     : on(5)        ? "עיר"
+                                    : "מיקוד",
+                     text(5), LineContent::kCityZip, slack(5)});
+  }
+  if (on(7)) lines.push_back({"טלפון", text(7), LineContent::kPhone, slack(7)});
+  if (Panel::On(panel.ChkLogo[1]))
+    lines.push_back({"התמונה התחתונה", picture(1), LineContent::kAlways, 0.75});
+  return lines;
+}
+
+// Counts, for each paper, the labels that lose a line holding something.
+class FitCounter {
+ public:
+  FitCounter(const Panel& panel, const LabelSettings& labels, const SheetGeometry& g)
+      : lines_(ChosenLines(panel, labels)), rows_(g.rows) {
+    const double percent = std::stod(PercentOfOne(g.rows));
+    for (size_t p = 0; p < std::size(kPapers); ++p) {
+      const double rowPt = kPapers[p].heightMm * percent / 100 * 72 / 25.4;
+      double bottom = 0;
+      for (size_t i = 0; i < lines_.size(); ++i) {
+        bottom += lines_[i].heightPt;
+        if (bottom > rowPt + lines_[i].slackPt) cut_[p].push_back(i);
+      }
+    }
+  }
+
+  bool AnyCut() const { return !cut_[0].empty() || !cut_[1].empty(); }
+
+  void Count(const db::Snapshot& rs, const LabelFields& f) {
+    for (size_t p = 0; p < std::size(kPapers); ++p) {
+      for (size_t i : cut_[p]) {
+        if (Holds(rs, f, lines_[i].content)) {
+          ++labels_[p];
+          break;
+        }
+      }
+    }
+  }
+
+  // The message for the clerk, or an empty string when no label loses a line.
+  std::string Message() const {
+    std::string out;
+    for (size_t p = 0; p < std::size(kPapers); ++p) {
+      if (labels_[p] == 0) continue;
+      out += out.empty() ? "" : "; ";
+      out += std::string("בדף ") + kPapers[p].name +
+             (cut_[p].size() == 1 ? " נחתכת השורה " : " נחתכות השורות ");
+      for (size_t k = 0; k < cut_[p].size(); ++k)
+        out += (k == 0 ? "\"" : ", \"") + lines_[cut_[p][k]].caption + "\"";
+      out += " ב-" + std::to_string(labels_[p]) + " מדבקות";
+    }
+    if (out.empty()) return out;
+    return "שורות המדבקה בגדלים שנבחרו גבוהות משורה של הגיליון (" + std::to_string(rows_) +
+           " שורות בעמוד), והדפדפן יחתוך אותן: " + out +
+           ". הקטינו את גודל הגופן או את מספר השורות, או הפיקו את המדבקות כ-PDF על גיליון "
+           "מדבקות (בהגדרות המדבקה), שמקטין את הגופן עד שכל השורות נכנסות.";
+  }
+
+ private:
+  static bool Filled(const db::Value& v) {
+    if (db::IsNull(v)) return false;
+    const auto* s = std::get_if<std::string>(&v);
+    return s == nullptr || s->find_first_not_of(' ') != std::string::npos;
+  }
+  static bool Holds(const db::Snapshot& rs, const LabelFields& f, LineContent c) {
+    switch (c) {
+      case LineContent::kAlways:
+        return true;
+      case LineContent::kName:
+        return Filled(rs.Field(f.name));
+      case LineContent::kKey:
+        return Filled(rs.Field(f.key));
+      case LineContent::kDetails:
+        return Filled(rs.Field(f.details));
+      case LineContent::kAddress:
+        return Filled(rs.Field(f.address));
+      case LineContent::kDistrict:
+        return Filled(rs.Field(f.district));
+      case LineContent::kCityZip:
+        return Filled(rs.Field(f.city)) || Filled(rs.Field(f.zip));
+      case LineContent::kPhone:
+        return Filled(rs.Field(f.telephone));
+    }
+    return false;
+  }
+
+  std::vector<FitLine> lines_;
+  int64_t rows_;
+  std::vector<size_t> cut_[std::size(kPapers)];
+  int64_t labels_[std::size(kPapers)] = {};
+};
+
 class SheetWriter {
  public:
   SheetWriter(CodePageFile& f, db::Snapshot& rs, const SheetGeometry& g, const Panel& panel,
               const LabelSettings& labels)
-      : f_(f), rs_(rs), g_(g), fields_(rs) {
+      : f_(f), rs_(rs), g_(g), fields_(rs), fit_(panel, labels, g) {
     for (int i = 0; i < 9; ++i) title_[i] = Panel::On(panel.ChkTitle[i]);
     for (int i = 0; i < 2; ++i) {
       logo_[i] = Panel::On(panel.ChkLogo[i]);
@@ -113,6 +260,9 @@ class SheetWriter {
     cellOpen_ = "    <td valign='middle' width='" + PercentOfOne(g.cols) + "%' height='" +
                 PercentOfOne(g.rows) + "%' align='center'>";
   }
+
+  // Which labels lose lines to the row's height.
+  const FitCounter& fit() const { return fit_; }
 
   void WritePage(int64_t page) {
     f_.Line(
@@ -135,6 +285,7 @@ class SheetWriter {
     f_.Line("     <table border='0' cellpadding='1' cellspacing='0' dir='rtl'>");
     if (!rs_.AtEnd() && !skipped) {
       WriteLabel();
+      if (fit_.AnyCut()) fit_.Count(rs_, fields_);
       if (++copy_ == g_.copies) {
         copy_ = 0;
         rs_.MoveNext();
@@ -200,6 +351,7 @@ class SheetWriter {
   std::string cellOpen_;
   std::string line_;
   int64_t copy_ = 0;
+  FitCounter fit_;
 };
 
 }  // namespace
@@ -247,6 +399,8 @@ void CreateLabFile(const std::string& pFileName, const std::string& pDBFile, con
   f.Line("</BODY>");
   f.Line("</HTML>");
   f.Close();
+  if (const std::string cut = sheet.fit().Message(); !cut.empty())
+    ui.ShowMessage(cut, kTitleAttention, MsgIcon::Exclamation);
 }
 
 }  // namespace zdr

@@ -2,14 +2,16 @@
 //
 // Geometry is exact in millimetres: a label's text starts `padding` inside its box (the
 // right edge for right-to-left text, the top edge for the first line), wherever the stock
-// places the box, moved by the offset. The label holds the lines of the HTML sheet, in the
-// same order and with the same switches, each in its line's font, size, weight, italic
-// and underline; the top and bottom pictures (PNG or JPEG) above and below them. Text is
-// shaped and laid out right to left (pango, HarfBuzz and fribidi), and the PDF's text reads
-// back in logical order. A line too wide for its label shrinks down to kMinLabelPointSize,
-// then ends in an ellipsis; lines too tall together shrink alike, and what still does not
-// fit is left out (a message says on how many labels). Nothing is drawn outside a label's
-// box.
+// places the box, corrected for the printer by the StockOffset (scaled, then moved). The
+// label holds the lines of the HTML sheet, in the same order and with the same switches,
+// each in its line's font, size, weight, italic and underline, with blanks as the sheet's
+// browser shows them (none at the ends, runs as one); the account key as the sheet spreads
+// it, its kept characters from right to left; the top and bottom pictures (PNG, GIF, JPEG,
+// BMP or TIFF) above and below them. Text is shaped and laid out right to left (pango,
+// HarfBuzz and fribidi), and the PDF's text reads back in logical order. A line too wide
+// for its label shrinks down to kMinLabelPointSize, then ends in an ellipsis where its
+// reading ends; lines too tall together shrink alike, and what still does not fit is left
+// out (a message says on how many labels). Nothing is drawn outside a label's box.
 //
 // The file is written beside its target under a temporary name and renamed over it when
 // complete, so an existing file (or a link in its place) is replaced, never written
@@ -34,18 +36,21 @@ inline constexpr double kMinLabelPointSize = 5.0;
 
 // The label sheet as PDF on `stock`: the recipients of the panel's selection in query
 // order, each on `txtCopies` consecutive labels from position `txtStartFrom` of the first
-// sheet (positions below 1 mean the first). One page per sheet; the page count is the HTML
-// sheet's page count with the stock's rows and columns. The panel's rows and columns are
-// not used. Progress goes through the seam.
+// sheet (positions below 1 mean the first). One page per sheet, and only sheets that hold a
+// label: no blank sheet goes through the printer. The panel's rows and columns are not
+// used. A picture that cannot be read is named in a message and left out. Progress goes
+// through the seam.
 void CreateLabPdf(const std::string& pFileName, const std::string& pDBFile, const Panel& panel,
                   const DocTypeTable& docTypes, const std::string& selectDbPath,
                   const LabelSettings& labels, const LabelStock& stock, StockOffset offset,
                   UserSeam& ui);
 
-// One calibration page for `stock`, moved by `offset` as labels would be: every label's
-// outline with a cross on each corner, a millimetre scale along the page's top and right
-// edges, and scales from -10 to +10 mm across the first label's right and top edges for
-// reading the offset against a sheet of stock held behind the page.
+// One calibration page for `stock`, corrected by `offset` as labels would be: every
+// label's outline with a cross on each corner; four named scales from -10 to +10 mm across
+// the edges CalibrationMarksOf gives ("אופקי 1" and "אנכי 1" at the first label, "אופקי 2"
+// and "אנכי 2" at the last), kept clear of the outlines; and a numbered instruction for
+// reading them against a sheet of stock held behind the page and typing the readings into
+// the label dialog, which turns them into the correction (CorrectionFromReadings).
 void CreateCalibrationPdf(const std::string& pFileName, const LabelStock& stock,
                           StockOffset offset);
 

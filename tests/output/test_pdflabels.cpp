@@ -1,7 +1,9 @@
 // Label sheets on stock as PDF, read back with poppler's pdftotext: where every label's text
 // lands, that the offset moves it exactly, the page count, and the text in reading order.
+#include <cairo.h>
 #include <gtest/gtest.h>
 
+#include <sys/stat.h>
 #include <algorithm>
 #include <array>
 #include <cmath>
@@ -10,8 +12,10 @@
 #include <regex>
 
 #include "common/labelstock.h"
+#include "control/dataload.h"
 #include "output/outputtest.h"
 #include "output/pdflabels.h"
+#include "zdrgen/generator.h"
 
 namespace zdr::test {
 namespace {
@@ -134,8 +138,31 @@ TEST_F(PdfLabelsTest, FirstLineStartsAtThePaddingOnEveryStockAndPage) {
   }
 }
 
-// Copies and the start position work as on the HTML sheet: the page count is the sheets
-// needed, the first cells of the first sheet stay empty, copies sit side by side.
+// Only sheets that hold a label go through the printer. Regression: the page count was the
+// HTML sheet's, copies x (start + recipients - 1) labels, so start 7 with 2 copies of one
+// recipient gave a second, blank page, and a start beyond the first sheet a blank first one.
+TEST_F(PdfLabelsTest, OnlySheetsThatHoldALabelArePrinted) {
+  const LabelStock stock = *FindShippedStock("a4-2x4-105x74");  // 8 a sheet
+  const struct {
+    const char *start, *copies;
+    int recipients;
+    size_t pages;
+    int firstPosition;  // of the first label, on the first page printed
+  } cases[] = {{"7", "2", 1, 1, 7}, {"9", "1", 2, 1, 1}, {"1", "3", 3, 2, 1}, {"8", "1", 1, 1, 8}};
+  for (const auto& c : cases) {
+    SCOPED_TRACE(std::string(c.start) + " x" + c.copies);
+    panel.txtStartFrom = c.start;
+    panel.txtCopies = c.copies;
+    const auto pages = Words(Write(BuildDb(NumberedAccounts(c.recipients)), stock));
+    ASSERT_EQ(pages.size(), c.pages);
+    for (int position = 1; position < c.firstPosition; ++position)
+      EXPECT_TRUE(WordsIn(pages[0], StockLabelBox(stock, position)).empty()) << position;
+    EXPECT_FALSE(WordsIn(pages[0], StockLabelBox(stock, c.firstPosition)).empty());
+  }
+}
+
+// Copies and the start position work as on the HTML sheet: the first cells of the first
+// sheet stay empty, copies sit side by side.
 TEST_F(PdfLabelsTest, StartAndCopiesGiveTheSheetsOfTheHtmlSheet) {
   const LabelStock stock = *FindShippedStock("a4-2x4-105x74");  // 8 a sheet
   panel.txtStartFrom = "5";
@@ -175,6 +202,33 @@ TEST_F(PdfLabelsTest, TextReadsBackInReadingOrder) {
   }
 }
 
+// Lines that differ only in their digits share one shaping, the digits swapped; each such
+// line lands exactly where it lands shaped alone, in every font.
+TEST_F(PdfLabelsTest, LinesSharingAShapeLandWhereTheyLandAlone) {
+  const std::vector<AccountRow> rows = {
+      {"1", "כהן 1111", {}, "חיפה", "31000", {}, {}, "03-1111111"},
+      {"2", "כהן 9870", {}, "חיפה", "99999", {}, {}, "09-8765432"},
+      {"3", "ABC 1234 בע\"מ", {}, "תל אביב", "10001", {}, {}, "+972 4 1111111"},
+      {"40", "ABC 7777 בע\"מ", {}, "תל אביב", "47474", {}, {}, "+972 9 7070707"}};
+  panel.ChkTitle = {0, 1, 1, 0, 0, 1, 0, 1, 1};
+  const LabelStock stock = *FindShippedStock("a4-1x1-210x297");  // a page for each label
+  for (uint8_t font = 0; font <= 2; ++font) {
+    for (LabelLineDef& d : labels.LabelDefs) d = {font, 11, static_cast<uint8_t>(font), 0, 0};
+    const auto together = Words(Write(BuildDb(rows), stock, {}, "together.pdf"));
+    ASSERT_EQ(together.size(), rows.size());
+    for (size_t i = 0; i < rows.size(); ++i) {
+      SCOPED_TRACE(std::to_string(font) + " " + *rows[i].name);
+      const auto alone = Words(Write(BuildDb({rows[i]}), stock, {}, "alone.pdf"))[0];
+      ASSERT_EQ(alone.size(), together[i].size());
+      for (size_t w = 0; w < alone.size(); ++w) {
+        EXPECT_EQ(together[i][w].text, alone[w].text);
+        EXPECT_NEAR(together[i][w].xMin, alone[w].xMin, 0.005) << alone[w].text;
+        EXPECT_NEAR(together[i][w].xMax, alone[w].xMax, 0.005) << alone[w].text;
+      }
+    }
+  }
+}
+
 // A line too wide shrinks; at the smallest size it ends in an ellipsis; nothing leaves the
 // label, and lines too many for the label are left out with a message.
 TEST_F(PdfLabelsTest, LongLinesShrinkThenEndInAnEllipsis) {
@@ -192,6 +246,14 @@ TEST_F(PdfLabelsTest, LongLinesShrinkThenEndInAnEllipsis) {
   EXPECT_NE(text.find(shrinks), std::string::npos) << text;
   EXPECT_NE(text.find("…"), std::string::npos) << text;
   EXPECT_EQ(text.find(tooLong), std::string::npos);
+  // Regression: a Latin line cut short got its ellipsis on its left, where its reading
+  // starts. It ends the Latin word now, on its right.
+  const auto latin = std::find_if(pages[0].begin(), pages[0].end(),
+                                  [](const Word& w) { return w.text.starts_with("xxx"); });
+  const auto ellipsis = std::find_if(pages[0].begin(), pages[0].end(),
+                                     [](const Word& w) { return w.text.ends_with("…"); });
+  ASSERT_TRUE(latin != pages[0].end() && ellipsis != pages[0].end());
+  EXPECT_NEAR(ellipsis->xMin, latin->xMax, 0.2);
 
   // Eight lines do not fit 11 mm even at the smallest size.
   LabelStock narrow = stock;
@@ -228,20 +290,212 @@ TEST_F(PdfLabelsTest, FileIsReplacedNotWrittenThrough) {
   }
 }
 
-TEST_F(PdfLabelsTest, CalibrationPageShowsTheStockAndItsScales) {
-  const LabelStock stock = *FindShippedStock("a4-2x7-99.1x38.1");
-  const std::string path = PathOf("calibration.pdf");
-  CreateCalibrationPdf(path, stock, {0.5, -1});
-  const auto texts = PageTexts(path);
-  ASSERT_EQ(texts.size(), 1u);
-  EXPECT_NE(texts[0].find("דף כיול לתבנית a4-2x7-99.1x38.1"), std::string::npos) << texts[0];
-  EXPECT_NE(texts[0].find("0.5"), std::string::npos) << texts[0];
-  // The offset scale across the right column's left edge: its 0 stands on that edge.
-  const LabelBox first = StockLabelBox(stock, 1, {0.5, -1});
-  const auto words = Words(path)[0];
-  EXPECT_TRUE(std::any_of(words.begin(), words.end(), [&](const Word& w) {
-    return w.text == "0" && std::fabs((w.xMin + w.xMax) / 2 - first.x) < 0.3;
-  }));
+// The calibration page names its four scales and says step by step what to read and where
+// to type it; each scale's 0 stands on its mark, corrected as labels are; its figures are of
+// at least 7 points and stay on the page.
+TEST_F(PdfLabelsTest, CalibrationPageNamesItsScalesAndPutsTheirZerosOnTheMarks) {
+  for (const char* id : {"a4-2x7-99.1x38.1", "a4-3x8-70x37", "a4-2x4-105x74"}) {
+    SCOPED_TRACE(id);
+    const LabelStock stock = *FindShippedStock(id);
+    const StockOffset c{0.5, -1, 12, -8};
+    const std::string path = PathOf("calibration.pdf");
+    CreateCalibrationPdf(path, stock, c);
+    const auto texts = PageTexts(path);
+    ASSERT_EQ(texts.size(), 1u);
+    for (const char* part :
+         {"דף כיול לתבנית", "הדפיסו דף זה על נייר רגיל", "אופקי 1", "אופקי 2", "אנכי 1", "אנכי 2",
+          "הגדרות צורה וגודל", "\"חשב תיקון\"", "מספר חיובי", "כל הקריאות צריכות להיות"})
+      EXPECT_NE(texts[0].find(part), std::string::npos) << part << "\n" << texts[0];
+    const CalibrationMarks m = CalibrationMarksOf(stock);
+    const double kx = 1 + c.scaleX / 1000, ky = 1 + c.scaleY / 1000;
+    const auto words = Words(path)[0];
+    auto zeroAt = [&](double x, double y) {
+      return std::count_if(words.begin(), words.end(), [&](const Word& w) {
+        return w.text == "0" && (x < 0 || std::fabs((w.xMin + w.xMax) / 2 - x) < 0.2) &&
+               (y < 0 || std::fabs((w.yMin + w.yMax) / 2 - y) < 0.2);
+      });
+    };
+    EXPECT_GE(zeroAt(m.x1 * kx + c.x, -1), 1);
+    EXPECT_GE(zeroAt(m.x2 * kx + c.x, -1), 1);
+    EXPECT_GE(zeroAt(-1, m.y1 * ky + c.y), 1);
+    EXPECT_GE(zeroAt(-1, m.y2 * ky + c.y), 1);
+    for (const Word& w : words) {
+      if (w.text.find_first_not_of("-0123456789") != std::string::npos) continue;
+      EXPECT_GE((w.yMax - w.yMin) * 72 / 25.4, 7) << w.text;
+      if (w.text == "0") {
+        EXPECT_TRUE(w.xMin > 0 && w.xMax < stock.pageWidth && w.yMin > 0 &&
+                    w.yMax < stock.pageHeight);
+      }
+    }
+    for (const Word& w : words) {
+      if (w.text != "אופקי" && w.text != "יקפוא") continue;
+      EXPECT_TRUE(w.xMin >= kCalibrationEdgeMm - 0.5 && w.xMax <= stock.pageWidth) << w.xMax;
+    }
+  }
+}
+
+// The goal of the calibration: for a printer that shrinks by 1.5 % and shifts by (2, -1) mm,
+// the correction from the calibration page's readings puts every label's first line within
+// 0.3 mm of its place on the stock; uncorrected, the bottom row is mm off.
+TEST_F(PdfLabelsTest, CorrectedPdfKeepsFirstLinesOnTheStockThroughADriftingPrinter) {
+  const LabelStock stock = *FindShippedStock(kDefaultStockId);
+  const std::string db = BuildDb(NumberedAccounts(stock.LabelsPerPage()));
+  const double s = 0.985, dx = 2, dy = -1;
+  // What the clerk reads, to a tenth, on the page printed without correction.
+  const CalibrationMarks m = CalibrationMarksOf(stock);
+  auto read = [&](double p, double d) { return std::round((p - (s * p + d)) / s * 10) / 10; };
+  const auto c = CorrectionFromReadings(
+      stock, {}, {read(m.x1, dx), read(m.x2, dx), read(m.y1, dy), read(m.y2, dy)});
+  ASSERT_TRUE(c);
+  // Each label's first line: the right and top edges of its top words.
+  auto firstLines = [&](const Page& page, StockOffset placed) {
+    std::vector<std::pair<double, double>> out;
+    for (int p = 1; p <= stock.LabelsPerPage(); ++p) {
+      double top = 1e9, right = -1e9;
+      const auto in = WordsIn(page, StockLabelBox(stock, p, placed));
+      for (const Word& w : in) top = std::min(top, w.yMin);
+      for (const Word& w : in)
+        if (w.yMin < top + 0.5) right = std::max(right, w.xMax);
+      out.emplace_back(right, top);
+    }
+    return out;
+  };
+  const auto ideal = firstLines(Words(Write(db, stock, {}, "ideal.pdf"))[0], {});
+  const auto corrected = firstLines(Words(Write(db, stock, *c, "corrected.pdf"))[0], *c);
+  double worst = 0, uncorrected = 0;
+  for (size_t i = 0; i < ideal.size(); ++i) {
+    worst = std::max({worst, std::fabs(s * corrected[i].first + dx - ideal[i].first),
+                      std::fabs(s * corrected[i].second + dy - ideal[i].second)});
+    uncorrected = std::max({uncorrected, std::fabs(s * ideal[i].first + dx - ideal[i].first),
+                            std::fabs(s * ideal[i].second + dy - ideal[i].second)});
+  }
+  EXPECT_LE(worst, 0.3);
+  EXPECT_GT(uncorrected, 4);
+  std::printf("first lines through the printer: %.2f mm off uncorrected, %.2f mm corrected\n",
+              uncorrected, worst);
+}
+
+// Regression: the key line printed the key as the load keeps it, reversed, so 10007 read
+// 70001 and only all-Hebrew keys came out right. Every label of the sample company shows its
+// key as the sheet's right-to-left cells do.
+TEST_F(PdfLabelsTest, KeyLineShowsTheKeyAsTheSheetDoes) {
+  zdrgen::WriteCompanies(dir_, 1, {.seed = 7});  // the sample company of the demo
+  ControlState state;
+  state.companyPath = (dir_ / "company1").string();
+  panel.ChkTitle = {0, 0, 1, 0, 0, 0, 0, 0, 0};
+  ReadAllData(true, panel, state, docTypes, seam);
+  CreateLabFile(PathOf("zdrlab1.htm"), state.workDbPath, panel, docTypes, "", labels, seam);
+  // The sheet's keys as shown: each spread table's cells, the first on the right.
+  std::vector<std::string> shown;
+  const std::string sheet = Utf8File(PathOf("zdrlab1.htm"));
+  static const std::regex table("<table class='Line2'[^>]*><tr>(.*?)</tr></table>");
+  static const std::regex cell("<td>(.*?)</td>");
+  for (std::sregex_iterator t(sheet.begin(), sheet.end(), table), end; t != end; ++t) {
+    const std::string cells = (*t)[1];
+    std::vector<std::string> chars;
+    for (std::sregex_iterator c(cells.begin(), cells.end(), cell); c != end; ++c)
+      chars.push_back((*c)[1] == "&nbsp;" ? " " : std::string((*c)[1]));
+    std::string visual;
+    for (auto it = chars.rbegin(); it != chars.rend(); ++it) visual += *it;
+    shown.push_back(visual);
+  }
+  ASSERT_GT(shown.size(), 150u);
+  const LabelStock stock = *FindShippedStock(kDefaultStockId);
+  const auto pages = Words(Write(state.workDbPath, stock));
+  size_t label = 0, mixed = 0;
+  for (const Page& page : pages) {
+    for (int p = 1; p <= stock.LabelsPerPage() && label < shown.size(); ++p, ++label) {
+      auto words = WordsIn(page, StockLabelBox(stock, p));
+      std::sort(words.begin(), words.end(),
+                [](const Word& a, const Word& b) { return a.xMin < b.xMin; });
+      std::string printed;
+      for (const Word& w : words) printed += (printed.empty() ? "" : " ") + w.text;
+      EXPECT_EQ(printed, shown[label]) << "label " << label + 1;
+      mixed += shown[label].find_first_of("0123456789") != std::string::npos &&
+               shown[label].find_first_of("\xD7") != std::string::npos;
+    }
+  }
+  EXPECT_EQ(label, shown.size());
+  EXPECT_GT(mixed, 0u) << "no key mixes Hebrew and digits";
+}
+
+// Blanks as the sheet's browser shows them. Regression: with the city empty, the blanks
+// between city and zip indented the zip by 4.4 mm where the sheet puts it flush right.
+TEST_F(PdfLabelsTest, LinesKeepTheBlanksTheSheetShows) {
+  const LabelStock stock = *FindShippedStock("a4-2x4-105x74");
+  panel.ChkTitle = {0, 1, 0, 0, 0, 1, 0, 0, 1};  // name, city and zip
+  const std::string pdf = Write(
+      BuildDb({{"1", "כהן   ובניו ", {}, {}, "31000"}, {"2", "לוי", {}, "חיפה", "32000"}}), stock);
+  const auto page = Words(pdf)[0];
+  for (int p = 1; p <= 2; ++p) {
+    const LabelBox box = StockLabelBox(stock, p);
+    double right = -1e9;
+    for (const Word& w : WordsIn(page, box))
+      if (w.text == "31000" || w.text == "חיפה" || w.text == "הפיח")
+        right = std::max(right, w.xMax);
+    EXPECT_NEAR(right, box.x + box.width - stock.padding, 0.2) << p;
+  }
+  const std::string text = PageTexts(pdf)[0];
+  EXPECT_NE(text.find("כהן ובניו\n31000"), std::string::npos) << text;
+  EXPECT_NE(text.find("חיפה 32000"), std::string::npos) << text;
+}
+
+// A picture is a regular file of a known kind, within a size and a pixel count; any other
+// is named in a message and the labels print without it. Regression: a FIFO hung the run,
+// /dev/zero read until memory ran out, a folder gave an English message, GIF was refused.
+TEST_F(PdfLabelsTest, PicturesThatCannotBeReadAreNamedAndLeftOut) {
+  namespace fs = std::filesystem;
+  auto bytes = [](std::initializer_list<int> b) { return std::string(b.begin(), b.end()); };
+  // A 1 x 1 GIF, the same claiming 20000 x 20000, and a 1 x 1 BMP.
+  const std::string gif =
+      bytes({'G', 'I', 'F', '8', '9', 'a', 1, 0, 1, 0, 0x80, 0, 0, 0xFF, 0xFF, 0xFF, 0,  0,
+             0,   ',', 0,   0,   0,   0,   1, 0, 1, 0, 0,    2, 2, 'D',  1,    0,    ';'});
+  std::string huge = gif;
+  for (size_t at : {6u, 8u, 24u, 26u}) huge.replace(at, 2, bytes({0x20, 0x4E}));
+  const std::string bmp =
+      bytes({'B', 'M', 58,   0,    0, 0, 0, 0, 0,  0, 54, 0, 0, 0, 40, 0, 0,    0, 1,    0,
+             0,   0,   1,    0,    0, 0, 1, 0, 24, 0, 0,  0, 0, 0, 4,  0, 0,    0, 0x13, 0x0B,
+             0,   0,   0x13, 0x0B, 0, 0, 0, 0, 0,  0, 0,  0, 0, 0, 0,  0, 0xFF, 0});
+  std::ofstream(PathOf("logo.gif"), std::ios::binary) << gif;
+  std::ofstream(PathOf("huge.gif"), std::ios::binary) << huge;
+  std::ofstream(PathOf("logo.bmp"), std::ios::binary) << bmp;
+  std::ofstream(PathOf("notes.txt")) << "not a picture";
+  {
+    cairo_surface_t* png = cairo_image_surface_create(CAIRO_FORMAT_ARGB32, 3, 2);
+    cairo_surface_write_to_png(png, PathOf("logo.png").c_str());
+    cairo_surface_destroy(png);
+  }
+  ASSERT_EQ(::mkfifo(PathOf("fifo").c_str(), 0600), 0);
+  std::ofstream(PathOf("big.png")).close();
+  fs::resize_file(PathOf("big.png"), 40 << 20);  // a hole: nothing is written
+  const struct {
+    std::string path;
+    const char* why;  // in the message; empty when the picture is drawn
+  } cases[] = {{PathOf("logo.gif"), ""},          {PathOf("logo.png"), ""},
+               {PathOf("logo.bmp"), ""},          {PathOf("none.png"), "לא נמצאה"},
+               {dir_.string(), "היא תיקייה"},     {PathOf("fifo"), "אינה קובץ רגיל"},
+               {"/dev/zero", "אינה קובץ רגיל"},   {PathOf("notes.txt"), "אינה קובץ PNG, GIF"},
+               {PathOf("huge.gif"), "גדולה מדי"}, {PathOf("big.png"), "גדולה מדי"}};
+  const LabelStock stock = *FindShippedStock("a4-2x4-105x74");
+  panel.ChkLogo = {1, 0};
+  for (const auto& c : cases) {
+    SCOPED_TRACE(c.path);
+    labels.LabPics[0] = c.path;
+    seam.messages.clear();
+    const std::string pdf = Write(BuildDb(NumberedAccounts(2)), stock);
+    EXPECT_EQ(PageTexts(pdf).size(), 1u);
+    const std::string images = Capture("pdfimages -list '" + pdf + "' 2>/dev/null");
+    const bool drawn = std::count(images.begin(), images.end(), '\n') > 2;
+    if (*c.why == '\0') {
+      EXPECT_TRUE(drawn) << images;
+      EXPECT_TRUE(seam.messages.empty());
+    } else {
+      EXPECT_FALSE(drawn) << images;
+      ASSERT_EQ(seam.messages.size(), 1u);
+      EXPECT_NE(seam.messages[0].text.find(c.why), std::string::npos) << seam.messages[0].text;
+      EXPECT_NE(seam.messages[0].text.find(c.path), std::string::npos);
+    }
+  }
 }
 
 }  // namespace
