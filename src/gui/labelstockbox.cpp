@@ -12,26 +12,43 @@
 #include <QMessageBox>
 #include <QPushButton>
 #include <QSpinBox>
+#include <QStandardItemModel>
+#include <cctype>
+#include <cmath>
 #include <exception>
 
 #include "control/control.h"
 #include "control/settings.h"
+#include "control/stockcatalogue.h"
 #include "gui/qtseam.h"
 #include "workdb/schema.h"
 
 namespace zdr::gui {
 namespace {
 
-QDoubleSpinBox* OffsetBox(const char* name, QWidget* parent) {
+QDoubleSpinBox* TenthsBox(const char* name, double range, const QString& unit, QWidget* parent) {
   auto* box = new QDoubleSpinBox(parent);
   box->setObjectName(QString::fromLatin1(name));
-  box->setRange(-kMaxOffsetMm, kMaxOffsetMm);
+  box->setRange(-range, range);
   box->setSingleStep(0.1);
   box->setDecimals(1);
-  box->setSuffix(QStringLiteral(" מ\"מ"));
+  box->setSuffix(unit);
   // Figures read left to right, the minus before the digits.
   box->setLayoutDirection(Qt::LeftToRight);
   return box;
+}
+
+QDoubleSpinBox* OffsetBox(const char* name, QWidget* parent) {
+  return TenthsBox(name, kMaxOffsetMm, QStringLiteral(" מ\"מ"), parent);
+}
+
+QDoubleSpinBox* ScaleBox(const char* name, QWidget* parent) {
+  return TenthsBox(name, kMaxScalePerMille, QStringLiteral(" ‰"), parent);
+}
+
+// The value of a box of tenths, without the binary noise of its double.
+double Tenths(const QDoubleSpinBox* box) {
+  return std::round(box->value() * 10) / 10 + 0.0;
 }
 
 QDoubleSpinBox* MmBox(const char* name, double value, QWidget* parent) {
@@ -70,7 +87,14 @@ LabelStockBox::LabelStockBox(Control& control, QWidget* parent)
   cmbStock->setObjectName(QStringLiteral("cmbStock"));
   txtOffsetX = OffsetBox("txtOffsetX", this);
   txtOffsetY = OffsetBox("txtOffsetY", this);
-  chkOwnOffset = new QCheckBox(QStringLiteral("היסט לתבנית זו בלבד"), this);
+  txtScaleX = ScaleBox("txtScaleX", this);
+  txtScaleY = ScaleBox("txtScaleY", this);
+  txtReadH1 = OffsetBox("txtReadH1", this);
+  txtReadH2 = OffsetBox("txtReadH2", this);
+  txtReadV1 = OffsetBox("txtReadV1", this);
+  txtReadV2 = OffsetBox("txtReadV2", this);
+  cmdApplyReadings = Button("cmdApplyReadings", QStringLiteral("חשב תיקון"), this);
+  chkOwnOffset = new QCheckBox(QStringLiteral("תיקון לתבנית זו בלבד"), this);
   chkOwnOffset->setObjectName(QStringLiteral("chkOwnOffset"));
   cmbOutput = new QComboBox(this);
   cmbOutput->setObjectName(QStringLiteral("cmbOutput"));
@@ -87,15 +111,29 @@ LabelStockBox::LabelStockBox(Control& control, QWidget* parent)
   grid->addWidget(new QLabel(QStringLiteral("אנכי (למטה):"), this), 1, 2);
   grid->addWidget(txtOffsetY, 1, 3);
   grid->addWidget(cmdCalibrate, 1, 4);
-  grid->addWidget(chkOwnOffset, 2, 1, 1, 3);
-  grid->addWidget(new QLabel(QStringLiteral("כפתור המדבקות מפיק:"), this), 3, 0);
-  grid->addWidget(cmbOutput, 3, 1, 1, 3);
+  grid->addWidget(new QLabel(QStringLiteral("קנה מידה אופקי:"), this), 2, 0);
+  grid->addWidget(txtScaleX, 2, 1);
+  grid->addWidget(new QLabel(QStringLiteral("אנכי:"), this), 2, 2);
+  grid->addWidget(txtScaleY, 2, 3);
+  grid->addWidget(chkOwnOffset, 3, 1, 1, 3);
+  // The calibration page's readings, each in the box named as its scale.
+  grid->addWidget(new QLabel(QStringLiteral("קריאות דף הכיול:"), this), 4, 0);
+  const std::pair<const char*, QDoubleSpinBox*> readings[] = {
+      {"אופקי 1", txtReadH1}, {"אופקי 2", txtReadH2}, {"אנכי 1", txtReadV1}, {"אנכי 2", txtReadV2}};
+  for (int i = 0; i < 4; ++i) {
+    grid->addWidget(new QLabel(QString::fromUtf8(readings[i].first), this), 5 + i / 2, i % 2 * 2);
+    grid->addWidget(readings[i].second, 5 + i / 2, i % 2 * 2 + 1);
+  }
+  grid->addWidget(cmdApplyReadings, 6, 4);
+  grid->addWidget(new QLabel(QStringLiteral("כפתור המדבקות מפיק:"), this), 7, 0);
+  grid->addWidget(cmbOutput, 7, 1, 1, 3);
   grid->setColumnStretch(1, 1);
   grid->setColumnStretch(3, 1);
 
   connect(cmbStock, &QComboBox::currentIndexChanged, this, [this] { ShowOffsetOf(ChosenStock()); });
   connect(cmdCalibrate, &QPushButton::clicked, this, [this] { CmdCalibrate_Click(); });
   connect(cmdNewStock, &QPushButton::clicked, this, [this] { CmdNewStock_Click(); });
+  connect(cmdApplyReadings, &QPushButton::clicked, this, [this] { CmdApplyReadings_Click(); });
 }
 
 void LabelStockBox::FillStocks(const std::string& choose) {
@@ -109,6 +147,28 @@ void LabelStockBox::FillStocks(const std::string& choose) {
   }
   for (const LabelStock& s : stocks) {
     cmbStock->addItem(ToQ(s.name + "   \u202A" + s.id + "\u202C"), ToQ(s.id));
+  }
+  // A retired stock the settings still name stays chosen, and says so.
+  if (cmbStock->findData(ToQ(choose)) < 0 && IsRetiredStock(choose)) {
+    if (auto retired = FindShippedStock(choose)) {
+      cmbStock->addItem(ToQ(retired->name + "   \u202A" + retired->id +
+                            "\u202C (לא מוצעת עוד: אין גיליון מפורסם כזה)"),
+                        ToQ(retired->id));
+    }
+  }
+  // The catalogue's stocks by brand and part; those that cannot be printed are shown
+  // greyed, with the reason.
+  const StockCatalogue& catalogue = InstalledStockCatalogue();
+  if (!catalogue.entries.empty()) cmbStock->insertSeparator(cmbStock->count());
+  auto* model = qobject_cast<QStandardItemModel*>(cmbStock->model());
+  for (const CatalogueEntry& e : catalogue.entries) {
+    const std::string caption = e.stock ? e.stock->name : e.problem;
+    cmbStock->addItem(ToQ("\u202A" + e.id + "\u202C   " + caption), ToQ(e.id));
+    if (!e.stock && model != nullptr) {
+      QStandardItem* item = model->item(cmbStock->count() - 1);
+      item->setEnabled(false);
+      item->setToolTip(ToQ(e.problem));
+    }
   }
   const int at = cmbStock->findData(ToQ(choose));
   cmbStock->setCurrentIndex(at >= 0 ? at : 0);
@@ -124,6 +184,9 @@ void LabelStockBox::ShowOffsetOf(const std::string& id) {
   chkOwnOffset->setChecked(own.has_value());
   txtOffsetX->setValue(shown.x);
   txtOffsetY->setValue(shown.y);
+  txtScaleX->setValue(shown.scaleX);
+  txtScaleY->setValue(shown.scaleY);
+  for (QDoubleSpinBox* r : {txtReadH1, txtReadH2, txtReadV1, txtReadV2}) r->setValue(0);
 }
 
 void LabelStockBox::Load() {
@@ -162,9 +225,38 @@ std::string LabelStockBox::ChosenStock() const {
 }
 
 StockOffset LabelStockBox::ShownOffset() const {
-  // The boxes hold tenths; rounding drops the binary noise of their doubles.
-  return {CheckedOffsetMm(std::round(txtOffsetX->value() * 10) / 10).value_or(0),
-          CheckedOffsetMm(std::round(txtOffsetY->value() * 10) / 10).value_or(0)};
+  return {CheckedOffsetMm(Tenths(txtOffsetX)).value_or(0),
+          CheckedOffsetMm(Tenths(txtOffsetY)).value_or(0),
+          CheckedScalePerMille(Tenths(txtScaleX)).value_or(0),
+          CheckedScalePerMille(Tenths(txtScaleY)).value_or(0)};
+}
+
+std::string LabelStockBox::CmdApplyReadings_Click() {
+  std::string problem;
+  const std::optional<LabelStock> stock = FindLabelStock(control_.store(), ChosenStock());
+  std::optional<StockOffset> corrected;
+  if (stock) {
+    corrected = CorrectionFromReadings(
+        *stock, ShownOffset(),
+        {Tenths(txtReadH1), Tenths(txtReadH2), Tenths(txtReadV1), Tenths(txtReadV2)});
+  }
+  if (!stock) {
+    problem = LabelStockLookupProblem(control_.store(), ChosenStock());
+  } else if (!corrected) {
+    problem =
+        "הקריאות נותנות תיקון מעבר לתחום (היסט עד 10 מ\"מ, קנה מידה עד 100 פרומיל): בדקו את "
+        "הקריאות ואת הדפסת דף הכיול בגודל מלא";
+  }
+  if (!problem.empty()) {
+    control_.ui().ShowMessage(problem, kTitleError, MsgIcon::Exclamation);
+    return problem;
+  }
+  txtOffsetX->setValue(corrected->x);
+  txtOffsetY->setValue(corrected->y);
+  txtScaleX->setValue(corrected->scaleX);
+  txtScaleY->setValue(corrected->scaleY);
+  for (QDoubleSpinBox* r : {txtReadH1, txtReadH2, txtReadV1, txtReadV2}) r->setValue(0);
+  return "";
 }
 
 std::string LabelStockBox::CmdCalibrate_Click() {
@@ -186,7 +278,12 @@ std::string LabelStockBox::AddStock(const LabelStock& stock) {
 void LabelStockBox::CmdNewStock_Click() {
   LabelStock start;
   if (auto chosen = FindLabelStock(control_.store(), ChosenStock())) start = *chosen;
+  // A catalogue id ("Avery L7160") as a name of the user's own: blanks and the like as '-'.
+  for (char& c : start.id) {
+    if (!std::isalnum(static_cast<unsigned char>(c)) && c != '.' && c != '_') c = '-';
+  }
   start.id += "-mine";
+  start.source.clear();
   LabelStockDialog dialog(start, this);
   while (dialog.exec() == QDialog::Accepted) {
     const std::string problem = AddStock(dialog.Stock());

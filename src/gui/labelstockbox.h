@@ -1,6 +1,8 @@
-// The label settings dialog's part for labels on stock: which stock, the printer's offset
-// (the user's, or the stock's own), what the label button gives (the HTML sheet or the
-// PDF), the calibration page, and the user's own stocks.
+// The label settings dialog's part for labels on stock: which stock (shipped, the user's
+// own, or from the installed catalogue by brand and part), the printer's correction (the
+// user's, or the stock's own: an offset and a scale), the calibration page and the four
+// readings that turn into the correction, and what the label button gives (the HTML sheet
+// or the PDF).
 #pragma once
 
 #include <QDialog>
@@ -33,13 +35,17 @@ class LabelStockBox : public QGroupBox {
   // as the dialog's confirm ignores them.
   void Save();
 
-  // The stock chosen and the offset shown.
+  // The stock chosen and the correction shown.
   std::string ChosenStock() const;
   StockOffset ShownOffset() const;
 
   // Writes the chosen stock's calibration page, with the offset shown, in the temporary
   // folder and opens it. Returns its path, or empty when it failed (shown through the seam).
   std::string CmdCalibrate_Click();
+  // Turns the four readings of the calibration page into the correction shown (the page
+  // was printed with the correction shown) and clears them. Returns an empty string, or
+  // the reason it could not (also shown through the seam).
+  std::string CmdApplyReadings_Click();
   // Asks for a new stock (starting from the chosen one) and adds it.
   void CmdNewStock_Click();
   // Adds `stock` to the user's stocks and chooses it. Returns the reason it was refused,
@@ -49,8 +55,13 @@ class LabelStockBox : public QGroupBox {
   QComboBox* cmbStock;
   QDoubleSpinBox* txtOffsetX;
   QDoubleSpinBox* txtOffsetY;
-  QCheckBox* chkOwnOffset;  // the offset belongs to the chosen stock only
-  QComboBox* cmbOutput;     // 0 the HTML sheet, 1 the PDF
+  QDoubleSpinBox* txtScaleX;  // per mille
+  QDoubleSpinBox* txtScaleY;
+  QCheckBox* chkOwnOffset;  // the correction belongs to the chosen stock only
+  // The readings of the calibration page's scales "אופקי 1", "אופקי 2", "אנכי 1", "אנכי 2".
+  QDoubleSpinBox *txtReadH1, *txtReadH2, *txtReadV1, *txtReadV2;
+  QPushButton* cmdApplyReadings;
+  QComboBox* cmbOutput;  // 0 the HTML sheet, 1 the PDF
   QPushButton* cmdCalibrate;
   QPushButton* cmdNewStock;
 

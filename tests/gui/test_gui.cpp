@@ -493,4 +493,41 @@ TEST_F(GuiTest, StockChoicesAreKeptAndAStocksOwnOffsetStaysWithIt) {
   EXPECT_EQ(desk_.pages, std::vector<std::string>{(temp_.dir() / "zdrcalib.pdf").string()});
 }
 
+// The calibration page's four readings become the chosen stock's correction, kept with it;
+// readings beyond the ranges are told and change nothing. The catalogue's stocks are offered
+// by brand and part, those that cannot be printed greyed with the reason.
+TEST_F(GuiTest, CalibrationReadingsBecomeTheCorrection) {
+  LabelStockBox& box = *card_->labDefDialog()->StockBox;
+  box.Load();
+  box.cmbStock->setCurrentIndex(box.cmbStock->findData(QStringLiteral("a4-3x8-70x37")));
+  // A printer 1.5 % small, shifted by (2, -1) mm, read to a tenth.
+  const std::pair<QDoubleSpinBox*, double> readings[] = {
+      {box.txtReadH1, 0.1}, {box.txtReadH2, -1.0}, {box.txtReadV1, 1.6}, {box.txtReadV2, 5.0}};
+  for (const auto& [field, value] : readings) field->setValue(value);
+  Press(box, "cmdApplyReadings");
+  EXPECT_TRUE(desk_.shown.empty());
+  EXPECT_DOUBLE_EQ(box.txtOffsetX->value(), -2.1);
+  EXPECT_DOUBLE_EQ(box.txtOffsetY->value(), 1.0);
+  EXPECT_DOUBLE_EQ(box.txtScaleX->value(), 15.7);
+  EXPECT_DOUBLE_EQ(box.txtScaleY->value(), 15.3);
+  for (const auto& [field, value] : readings) EXPECT_EQ(field->value(), 0);
+  box.chkOwnOffset->setChecked(true);
+  box.Save();
+  EXPECT_EQ(Stored("LabelStock.a4-3x8-70x37", "ScaleX"), "15.7");
+  EXPECT_EQ(Stored("LabelStock.a4-3x8-70x37", "OffsetY"), "1");
+
+  box.txtReadH2->setValue(10);  // 10 mm over 70: far beyond any printer
+  EXPECT_NE(box.CmdApplyReadings_Click(), "");
+  ASSERT_EQ(desk_.shown.size(), 1u);
+  EXPECT_NE(desk_.shown[0].first.find("מעבר לתחום"), std::string::npos);
+  EXPECT_DOUBLE_EQ(box.txtScaleX->value(), 15.7);
+
+  EXPECT_GE(box.cmbStock->findData(QStringLiteral("Avery L7160")), 0);
+  const int cd = box.cmbStock->findData(QStringLiteral("Avery L6015"));
+  ASSERT_GE(cd, 0);
+  QStandardItem* item = qobject_cast<QStandardItemModel*>(box.cmbStock->model())->item(cd);
+  EXPECT_FALSE(item->isEnabled());
+  EXPECT_TRUE(item->toolTip().contains(QStringLiteral("תקליטור")));
+}
+
 }  // namespace
