@@ -5,6 +5,7 @@
 #include <cmath>
 #include <cstdio>
 #include <iterator>
+#include <utility>
 
 namespace zdr {
 namespace {
@@ -106,6 +107,15 @@ bool IdChar(char c) {
 
 bool Near(double a, double b) {
   return std::fabs(a - b) < 0.05;
+}
+
+// `v` on a step of 0.1 within +-`most` (after rounding away binary noise), or nothing.
+std::optional<double> CheckedTenths(double v, double most) {
+  if (!std::isfinite(v)) return std::nullopt;
+  const double tenths = std::round(v * 10);
+  if (std::fabs(v * 10 - tenths) > 1e-6) return std::nullopt;
+  if (std::fabs(tenths) > most * 10) return std::nullopt;
+  return tenths / 10 + 0.0;  // + 0.0 turns -0 into 0
 }
 
 }  // namespace
@@ -250,19 +260,11 @@ std::optional<StockOffset> CorrectionFromReadings(const LabelStock& stock, Stock
 }
 
 std::optional<double> CheckedScalePerMille(double perMille) {
-  if (!std::isfinite(perMille)) return std::nullopt;
-  const double tenths = std::round(perMille * 10);
-  if (std::fabs(perMille * 10 - tenths) > 1e-6) return std::nullopt;
-  if (std::fabs(tenths) > kMaxScalePerMille * 10) return std::nullopt;
-  return tenths / 10 + 0.0;
+  return CheckedTenths(perMille, kMaxScalePerMille);
 }
 
 std::optional<double> CheckedOffsetMm(double mm) {
-  if (!std::isfinite(mm)) return std::nullopt;
-  const double tenths = std::round(mm * 10);
-  if (std::fabs(mm * 10 - tenths) > 1e-6) return std::nullopt;
-  if (std::fabs(tenths) > kMaxOffsetMm * 10) return std::nullopt;
-  return tenths / 10 + 0.0;  // + 0.0 turns -0 into 0
+  return CheckedTenths(mm, kMaxOffsetMm);
 }
 
 std::optional<double> ParseMm(std::string_view text) {
@@ -278,26 +280,33 @@ std::optional<double> ParseMm(std::string_view text) {
   return v;
 }
 
-std::optional<StockOffset> ParseStockOffset(std::string_view text) {
+namespace {
+
+// "X,Y", each number passing `check`.
+std::optional<std::pair<double, double>> ParsePair(std::string_view text,
+                                                   std::optional<double> (*check)(double)) {
   const size_t comma = text.find(',');
   if (comma == std::string_view::npos) return std::nullopt;
   const auto x = ParseMm(text.substr(0, comma));
   const auto y = ParseMm(text.substr(comma + 1));
   if (!x || !y) return std::nullopt;
-  const auto cx = CheckedOffsetMm(*x), cy = CheckedOffsetMm(*y);
+  const auto cx = check(*x), cy = check(*y);
   if (!cx || !cy) return std::nullopt;
-  return StockOffset{*cx, *cy};
+  return std::pair(*cx, *cy);
+}
+
+}  // namespace
+
+std::optional<StockOffset> ParseStockOffset(std::string_view text) {
+  const auto xy = ParsePair(text, CheckedOffsetMm);
+  if (!xy) return std::nullopt;
+  return StockOffset{xy->first, xy->second};
 }
 
 std::optional<StockOffset> ParseStockScale(std::string_view text) {
-  const size_t comma = text.find(',');
-  if (comma == std::string_view::npos) return std::nullopt;
-  const auto x = ParseMm(text.substr(0, comma));
-  const auto y = ParseMm(text.substr(comma + 1));
-  if (!x || !y) return std::nullopt;
-  const auto cx = CheckedScalePerMille(*x), cy = CheckedScalePerMille(*y);
-  if (!cx || !cy) return std::nullopt;
-  return StockOffset{0, 0, *cx, *cy};
+  const auto xy = ParsePair(text, CheckedScalePerMille);
+  if (!xy) return std::nullopt;
+  return StockOffset{0, 0, xy->first, xy->second};
 }
 
 std::string FormatMm(double mm) {
