@@ -614,6 +614,7 @@ struct LabelItem {
   int style = 0;     // the line's appearance settings, 0..7
   std::string text;
 };
+
 class LabelPainter {
  public:
   LabelPainter(const LabelSettings& labels, std::array<std::optional<Picture>, 2>& pictures,
