@@ -452,12 +452,30 @@ TEST_F(PdfLabelsTest, PicturesThatCannotBeReadAreNamedAndLeftOut) {
              0,   ',', 0,   0,   0,   0,   1, 0, 1, 0, 0,    2, 2, 'D',  1,    0,    ';'});
   std::string huge = gif;
   for (size_t at : {6u, 8u, 24u, 26u}) huge.replace(at, 2, bytes({0x20, 0x4E}));
+  // A PNG whose header says 20000 x 20000, its pixels never reached.
+  auto chunk = [](const std::string& type, const std::string& data) {
+    uint32_t crc = 0xFFFFFFFF;
+    for (unsigned char b : type + data) {
+      crc ^= b;
+      for (int k = 0; k < 8; ++k) crc = crc >> 1 ^ (0xEDB88320u & (0u - (crc & 1)));
+    }
+    crc = ~crc;
+    auto be = [](uint32_t v) {
+      return std::string{char(v >> 24), char(v >> 16), char(v >> 8), char(v)};
+    };
+    return be(static_cast<uint32_t>(data.size())) + type + data + be(crc);
+  };
+  const std::string hugePng =
+      "\x89PNG\r\n\x1a\n" +
+      chunk("IHDR", bytes({0, 0, 0x4E, 0x20, 0, 0, 0x4E, 0x20, 8, 6, 0, 0, 0})) +
+      chunk("IDAT", "") + chunk("IEND", "");
   const std::string bmp =
       bytes({'B', 'M', 58,   0,    0, 0, 0, 0, 0,  0, 54, 0, 0, 0, 40, 0, 0,    0, 1,    0,
              0,   0,   1,    0,    0, 0, 1, 0, 24, 0, 0,  0, 0, 0, 4,  0, 0,    0, 0x13, 0x0B,
              0,   0,   0x13, 0x0B, 0, 0, 0, 0, 0,  0, 0,  0, 0, 0, 0,  0, 0xFF, 0});
   std::ofstream(PathOf("logo.gif"), std::ios::binary) << gif;
   std::ofstream(PathOf("huge.gif"), std::ios::binary) << huge;
+  std::ofstream(PathOf("huge.png"), std::ios::binary) << hugePng;
   std::ofstream(PathOf("logo.bmp"), std::ios::binary) << bmp;
   std::ofstream(PathOf("notes.txt")) << "not a picture";
   {
@@ -475,7 +493,8 @@ TEST_F(PdfLabelsTest, PicturesThatCannotBeReadAreNamedAndLeftOut) {
                {PathOf("logo.bmp"), ""},          {PathOf("none.png"), "לא נמצאה"},
                {dir_.string(), "היא תיקייה"},     {PathOf("fifo"), "אינה קובץ רגיל"},
                {"/dev/zero", "אינה קובץ רגיל"},   {PathOf("notes.txt"), "אינה קובץ PNG, GIF"},
-               {PathOf("huge.gif"), "גדולה מדי"}, {PathOf("big.png"), "גדולה מדי"}};
+               {PathOf("huge.gif"), "גדולה מדי"}, {PathOf("huge.png"), "20000×20000"},
+               {PathOf("big.png"), "גדולה מדי"}};
   const LabelStock stock = *FindShippedStock("a4-2x4-105x74");
   panel.ChkLogo = {1, 0};
   for (const auto& c : cases) {
