@@ -21,7 +21,7 @@ StockChoice ChooseStock(SettingsStore& store, const LabelPdfSettings& pdf,
                         const std::string& stockId, const std::optional<StockOffset>& offset) {
   const std::string id = stockId.empty() ? pdf.Template : stockId;
   std::optional<LabelStock> stock = FindLabelStock(store, id);
-  if (!stock) throw std::runtime_error("תבנית המדבקות \"" + id + "\" אינה מוכרת");
+  if (!stock) throw std::runtime_error(LabelStockChoiceProblem(store, id));
   return {*stock, offset ? *offset : EffectiveStockOffset(store, pdf, stock->id)};
 }
 
@@ -34,11 +34,13 @@ void OpenPdf(UserSeam& ui, const std::string& path) {
 
 std::string Control::CmdLabPdf(const std::string& path, const std::string& stockId,
                                std::optional<StockOffset> offset) {
+  lastLoad_ = {true, 0};
+  if (TargetRefused(path, TargetKind::kPdf)) return "";
   try {
     const StockChoice choice = ChooseStock(store_, labelPdf_, stockId, offset);
     // The data load rebuilds the temporary folder's working database: no other run may.
     const auto lock = LockWorkFiles();
-    ReadAllData(true);
+    if (!ReadAllData(true).databaseUsable) return "";
     ui_.YieldToEvents();
     ui_.SetStatus("מכין רשימה");
     CreateLabPdf(path, state_.workDbPath, panel_, docTypes_, state_.selectDbPath, labels_,
@@ -54,6 +56,8 @@ std::string Control::CmdLabPdf(const std::string& path, const std::string& stock
 
 std::string Control::CmdCalibrate(const std::string& path, const std::string& stockId,
                                   std::optional<StockOffset> offset) {
+  lastLoad_ = {true, 0};
+  if (TargetRefused(path, TargetKind::kPdf)) return "";
   try {
     const StockChoice choice = ChooseStock(store_, labelPdf_, stockId, offset);
     CreateCalibrationPdf(path, choice.stock, choice.offset);

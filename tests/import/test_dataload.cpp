@@ -57,7 +57,7 @@ class DataLoad : public test::ImportTest {
     Write("a7.tmp", {zdrgen::BatchRecord({"A", {"43", "", "", ""}, day, day})});
   }
 
-  void Load(bool asIs = true) { ReadAllData(asIs, panel_, state_, docTypes_, seam_); }
+  LoadResult Load(bool asIs = true) { return ReadAllData(asIs, panel_, state_, docTypes_, seam_); }
   Strings Query(const std::string& sql) { return Rows(state_.workDbPath, sql); }
   Panel panel_;
   ControlState state_;
@@ -109,15 +109,17 @@ TEST_F(DataLoad, BadJournalBoundEndsTheLoadAtTheBatches) {
   EXPECT_EQ(Count(state_.workDbPath, "tAccount"), 2);
 }
 
-TEST_F(DataLoad, FailedDatabaseCreationStoresEmptyPathAndGoesOn) {
+// Regression: a database that could not be created (a full temporary folder) was followed by
+// every importer's "database file not found", which hid the cause.
+TEST_F(DataLoad, FailedDatabaseCreationIsTheOnlyMessage) {
   test::ScopedEnv temp("Temp", (root_ / "missing" / "folder").c_str());
   state_.workDbPath = "old";
-  Load();
+  const LoadResult r = Load();
   EXPECT_EQ(state_.workDbPath, "");
-  EXPECT_EQ(seam_.statuses, (Strings{kInit, kAccounts, kDone}));
-  ASSERT_EQ(seam_.messages.size(), 2u);
+  EXPECT_EQ(std::pair(r.databaseUsable, r.failures), std::pair(false, 1));
+  EXPECT_EQ(seam_.statuses, (Strings{kInit}));
+  ASSERT_EQ(seam_.messages.size(), 1u);
   EXPECT_EQ(seam_.messages[0].title, "תקלה");
-  EXPECT_EQ(seam_.messages[1].title, "תקלה בקריאת החשבונות");
 }
 
 TEST_F(DataLoad, AsIsReachesTheAccountImportAndCutOffBoxIsWrittenBack) {
