@@ -50,7 +50,9 @@ int main(int argc, char** argv) {
     if (args[i] == "--company" && i + 1 < args.size()) {
       company = args[++i];
     } else {
-      std::fprintf(stderr, "zdrlab: אפשרות לא מוכרת: %s (ראו zdrlab --help)\n", args[i].c_str());
+      std::fprintf(stderr, "zdrlab: %s: %s (ראו zdrlab --help)\n",
+                   args[i].starts_with("-") ? "אפשרות לא מוכרת" : "פקודה לא מוכרת",
+                   args[i].c_str());
       return 2;
     }
   }
