@@ -30,7 +30,7 @@ const char* const kUsage =
     "שימוש: zdrlab labels|list|post [--company DIR] [--settings FILE] [--set NAME=VALUE]... "
     "[--open] [--times]\n"
     "       zdrlab post [--check] [--strict] ...\n"
-    "       zdrlab labels --pdf FILE [--template ID] [--offset X,Y] [options as above]\n"
+    "       zdrlab labels --pdf FILE [--template ID] [--offset X,Y] [...]\n"
     "       zdrlab calibrate --pdf FILE [--template ID] [--offset X,Y] [--settings FILE]\n"
     "  labels     דף המדבקות zdrlab1.htm; עם --pdf, המדבקות כ-PDF על תבנית המדבקות ID\n"
     "             (בלי --template: התבנית השמורה בהגדרות, בהתחלה a4-3x8-70x37), בהיסט X,Y מ\"מ\n"

@@ -5,6 +5,7 @@
 
 #include <cstdint>
 #include <cstdio>
+#include <filesystem>
 #include <string>
 #include <string_view>
 
@@ -69,6 +70,13 @@ namespace output_internal {
 
 // True when LibreOffice, which writes the .xls and .ods workbooks, is installed.
 bool OfficeConverterInstalled();
+
+// ASCII letters in lower case, other bytes as they are.
+std::string LowerAscii(std::string s);
+// A path from UTF-8 text.
+std::filesystem::path PathFromUtf8(const std::string& s);
+// The path with every symbolic link resolved, as far as it exists.
+std::filesystem::path ResolvedPath(const std::filesystem::path& p);
 
 // Column indexes of the fields a label prints, in a recipients snapshot (the label sheet and
 // the label PDF print the same fields).

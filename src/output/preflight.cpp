@@ -62,7 +62,7 @@ bool IsIsraeliTelephone(std::string_view s) {
   }
   if (international) {
     if (!digits.starts_with("972")) return false;
-    digits = "0" + digits.substr(3);
+    digits.replace(0, 3, 1, '0');
   }
   if (digits.size() == 10 && (digits.starts_with("1700") || digits.starts_with("1800"))) {
     return !international;

@@ -30,10 +30,9 @@ namespace {
 
 namespace fs = std::filesystem;
 
-std::string Lower(std::string s) {
-  for (char& c : s) c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
-  return s;
-}
+using output_internal::LowerAscii;
+using output_internal::PathFromUtf8;
+using output_internal::ResolvedPath;
 
 // Splits at every comma (the file quotes nothing) into `cells`, reusing its strings.
 void SplitCsvLine(std::string_view line, std::vector<std::string>& cells) {
@@ -215,23 +214,10 @@ fs::path TempDir() {
   return fs::temp_directory_path();
 }
 
-fs::path PathFromUtf8(const std::string& s) {
-  return fs::path(std::u8string(s.begin(), s.end()));
-}
-
 std::string FindOffice() {
   std::string office = FindOnPath("soffice");
   if (office.empty()) office = FindOnPath("libreoffice");
   return office;
-}
-
-// The path with every symbolic link resolved, as far as it exists.
-fs::path Resolved(const fs::path& p) {
-  std::error_code ec;
-  fs::path abs = fs::absolute(p, ec);
-  if (ec) return p.lexically_normal();
-  fs::path canon = fs::weakly_canonical(abs, ec);
-  return ec ? abs.lexically_normal() : canon;
 }
 
 void ConvertWithOffice(const std::string& csvPath, const fs::path& target, const fs::path& into,
@@ -291,8 +277,8 @@ void ConvertToExcel(const std::string& pCsvFile, const std::string& pXlsFile, bo
   { const CsvLineReader readable(pCsvFile); }  // a missing file is reported before writing
   const fs::path target = PathFromUtf8(pXlsFile);
   // Written beside the file a link points to, so the link keeps pointing at the workbook.
-  ReplacingFile pending(Resolved(target));
-  if (Lower(target.extension().string()) == ".xlsx") {
+  ReplacingFile pending(ResolvedPath(target));
+  if (LowerAscii(target.extension().string()) == ".xlsx") {
     WriteXlsx(pCsvFile, pending.writePath(), pOpenExcel, findings, showFindings);
   } else {
     ConvertWithOffice(pCsvFile, target, pending.writePath(), pOpenExcel, findings, showFindings);

@@ -20,26 +20,12 @@ namespace {
 
 namespace fs = std::filesystem;
 
-std::string Lower(std::string s) {
-  for (char& c : s) c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
-  return s;
-}
+using output_internal::LowerAscii;
+using output_internal::PathFromUtf8;
+using output_internal::ResolvedPath;
 
 bool EndsWith(std::string_view text, std::string_view tail) {
   return text.size() >= tail.size() && text.substr(text.size() - tail.size()) == tail;
-}
-
-fs::path PathFromUtf8(const std::string& s) {
-  return fs::path(std::u8string(s.begin(), s.end()));
-}
-
-// The path with every symbolic link resolved, as far as it exists.
-fs::path Resolved(const fs::path& p) {
-  std::error_code ec;
-  fs::path abs = fs::absolute(p, ec);
-  if (ec) return p.lexically_normal();
-  fs::path canon = fs::weakly_canonical(abs, ec);
-  return ec ? abs.lexically_normal() : canon;
 }
 
 bool IsWithin(const fs::path& path, const fs::path& folder) {
@@ -54,7 +40,7 @@ bool IsWithin(const fs::path& path, const fs::path& folder) {
 // The names the host accounting system gives its files: record files "*.fix" (ACT.fix,
 // ADF.FIX, amv.fix ...) and the temporary batches "a*.tmp".
 bool IsHostFileName(const fs::path& p) {
-  const std::string name = Lower(p.filename().string());
+  const std::string name = LowerAscii(p.filename().string());
   return EndsWith(name, ".fix") || (name.size() > 5 && name[0] == 'a' && EndsWith(name, ".tmp"));
 }
 
@@ -76,12 +62,20 @@ bool TakesExtension(TargetKind kind, const std::string& ext, const fs::path& tar
   return true;
 }
 
+// ".<name>.", the start of a hidden temporary name beside `target`.
+std::string HiddenPrefix(const fs::path& target) {
+  std::string name(1, '.');
+  name += target.filename().string();
+  name += '.';
+  return name;
+}
+
 // A hidden temporary name beside `target`: ".<name>.XXXXXX", the X letters and digits.
 fs::path TemporaryName(const fs::path& target) {
   static const char kChars[] = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789";
   thread_local std::mt19937 random{std::random_device{}()};
   std::uniform_int_distribution<size_t> pick(0, sizeof kChars - 2);
-  std::string name = "." + target.filename().string() + ".";
+  std::string name = HiddenPrefix(target);
   for (int i = 0; i < 6; ++i) name += kChars[pick(random)];
   return target.parent_path() / name;
 }
@@ -106,18 +100,39 @@ void PutInPlace(const fs::path& from, const fs::path& target) {
 
 }  // namespace
 
+namespace output_internal {
+
+std::string LowerAscii(std::string s) {
+  for (char& c : s) c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
+  return s;
+}
+
+fs::path PathFromUtf8(const std::string& s) {
+  return fs::path(std::u8string(s.begin(), s.end()));
+}
+
+fs::path ResolvedPath(const fs::path& p) {
+  std::error_code ec;
+  fs::path abs = fs::absolute(p, ec);
+  if (ec) return p.lexically_normal();
+  fs::path canon = fs::weakly_canonical(abs, ec);
+  return ec ? abs.lexically_normal() : canon;
+}
+
+}  // namespace output_internal
+
 void CheckOutputTarget(const std::string& path, TargetKind kind,
                        const std::vector<std::string>& companyFolders) {
   if (path.empty()) throw OutputError("לא הוגדר קובץ פלט");
   const fs::path target = PathFromUtf8(path);
-  const fs::path resolved = Resolved(target);
+  const fs::path resolved = ResolvedPath(target);
   std::error_code ec;
   const fs::file_status st = fs::status(resolved, ec);
   if (fs::is_directory(st)) {
     throw OutputError("קובץ הפלט " + path + " הוא תיקייה. יש לבחור שם של קובץ");
   }
   for (const std::string& company : companyFolders) {
-    if (!company.empty() && IsWithin(resolved, Resolved(PathFromUtf8(company)))) {
+    if (!company.empty() && IsWithin(resolved, ResolvedPath(PathFromUtf8(company)))) {
       throw OutputError("קובץ הפלט " + path +
                         " נמצא בתיקיית החברה. יש לבחור קובץ פלט מחוץ לתיקיית הנהלת החשבונות");
     }
@@ -127,7 +142,7 @@ void CheckOutputTarget(const std::string& path, TargetKind kind,
                       " הוא בשם של קובץ הנהלת חשבונות. יש לבחור קובץ פלט שסיומתו " +
                       Suggested(kind));
   }
-  const std::string ext = Lower(target.extension().string());
+  const std::string ext = LowerAscii(target.extension().string());
   if (ext.size() < 2) {
     throw OutputError("לקובץ הפלט " + path + " אין סיומת. יש לבחור קובץ פלט שסיומתו " +
                       Suggested(kind));
@@ -157,7 +172,7 @@ void RemoveLeftoversOf(const fs::path& target) {
   const fs::path folder = target.parent_path().empty() ? fs::path(".") : target.parent_path();
   DIR* dir = ::opendir(folder.c_str());
   if (dir == nullptr) return;
-  const std::string hidden = "." + name + ".";
+  const std::string hidden = HiddenPrefix(target);
   const std::string plain = name + ".";
   while (const dirent* e = ::readdir(dir)) {
     const std::string_view entry = e->d_name;
@@ -165,7 +180,7 @@ void RemoveLeftoversOf(const fs::path& target) {
     // Earlier versions wrote the PDF as "<name>.XXXXXX", private, starting "%PDF-".
     const bool isOldPdf = !isHidden && entry.starts_with(plain) &&
                           IsTemporaryTail(entry.substr(plain.size())) &&
-                          EndsWith(Lower(name), ".pdf");
+                          EndsWith(LowerAscii(name), ".pdf");
     if (!isHidden && !isOldPdf) continue;
     const fs::path leftover = folder / std::string(entry);
     const int fd = ::open(leftover.c_str(), O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC);
@@ -213,7 +228,7 @@ ReplacingFile::ReplacingFile(const fs::path& target, Access access) : target_(ta
   if (fd_ < 0) {
     // Where the file system cannot: a hidden name, locked while this run writes it, so that
     // another run cleaning leftovers keeps it.
-    std::string pattern = (folder / ("." + target.filename().string() + ".XXXXXX")).string();
+    std::string pattern = (folder / (HiddenPrefix(target) + "XXXXXX")).string();
     fd_ = ::mkostemp(pattern.data(), O_CLOEXEC);
     if (fd_ < 0) {
       throw OutputError("לא ניתן ליצור קובץ בתיקייה של " + target.string() + ": " +

@@ -171,7 +171,9 @@ TEST_F(PreflightTest, FixedColumnsAreCheckedOnceForEveryRow) {
     const PreflightResult r = RunPreflight(db, 0, panel, docTypes, "", seam, fixed);
     EXPECT_EQ(Found(r), Rows(std::vector<int64_t>(rules.size(), 0), rules));
     EXPECT_EQ(r.errors, static_cast<int64_t>(rules.size()));
-    if (!r.findings.empty()) EXPECT_EQ(FindingCells(r.findings[0])[1], "כל השורות");
+    if (!r.findings.empty()) {
+      EXPECT_EQ(FindingCells(r.findings[0])[1], "כל השורות");
+    }
     EXPECT_TRUE(RunPreflight(db, 1, panel, docTypes, "", seam, fixed).findings.empty());
   }
 }
