@@ -203,19 +203,21 @@ const CliRun kRuns[] = {
      "labels.pdf ^%PDF-|zdrlab1.htm -;calibration.pdf ^%PDF-"},
     {"SettingsThatAskForThePdfGiveIt", "@labels", 0, "={T}/zdrlab1.pdf\n", "",
      "zdrlab1.pdf ^%PDF-|zdrlab1.pdf #600", "", "pdfsettings"},
+    // A user stock ("mine", its PageHeight missing) that fails its check says why.
     {"PdfOptionsAreChecked",
      "calibrate --settings {S};labels --template a4-2x4-105x74 --settings {S};"
      "labels --pdf {T}/x.pdf --offset 10.5,0 --settings {S};"
      "labels --pdf {T}/x.pdf --offset 0.05,0 --settings {S};"
-     "labels --pdf {T}/x.pdf --template none --settings {S};list --pdf {T}/x.pdf --settings {S}",
-     2, "", "", "x.pdf -"},
+     "labels --pdf {T}/x.pdf --template none --settings {S};list --pdf {T}/x.pdf --settings {S};"
+     "labels --pdf {T}/x.pdf --template mine --settings {S}",
+     2, "",
+     "צריכה --pdf;באים עם --pdf;--offset מקבל;--offset מקבל;\"none\" אינה מוכרת;אינה שייכת;"
+     "\"mine\" שבהגדרות אינה תקינה: הערך PageHeight",
+     "x.pdf -", "", "badstock"},
     {"LinkPlantedInTempRedirectedTheOutput", "@list;@post --set FilePath={T}/p.xlsx", 0,
      "={T}/zdrlab2.htm\n;={T}/p.xlsx\n", "",
      "victim =not yours|zdrlab.DB #|zdrlab2.htm #;victim =not yours|zdrlab.DB #|zdpost1.csv #", "",
      "links"},
-    // A user stock that fails its check says why instead of "unknown".
-    {"UnusableUserStockSaidUnknown", "labels --settings {S} --pdf {T}/x.pdf --template mine", 2, "",
-     "\"mine\" שבהגדרות אינה תקינה: הערך PageHeight", "x.pdf -", "", "badstock"},
 };
 
 // A company folder's file names and their bytes.
@@ -419,7 +421,9 @@ TEST_F(CliTest, RefusedValueIsWrongUsageByEveryWayIn) {
       EXPECT_EQ(r.exitCode, 2) << r.err;
       const std::string said = std::string(key) + " אינו תקין";
       EXPECT_TRUE(Matches(r.err, "\"" + std::string(value) + "\" של ההגדרה " + said)) << r.err;
-      if (inFile) EXPECT_TRUE(Matches(r.err, settings_.string())) << r.err;
+      if (inFile) {
+        EXPECT_TRUE(Matches(r.err, settings_.string())) << r.err;
+      }
       for (const char* file : {"p.xlsx", "zdpost1.csv", "zdrlab.DB"})
         EXPECT_FALSE(fs::exists(temp_ / file)) << file;
     }

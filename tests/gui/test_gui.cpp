@@ -447,30 +447,6 @@ TEST_F(GuiTest, SizeOf300ClosedTheLabelDialogAndDroppedLaterRows) {
   // clang-format on
 }
 
-TEST_F(GuiTest, DispatchDialogLoadsConfirmsAndCancels) {
-  store_.Save(kSettingsApp, kPostILSection, "Weight", "0.5");
-  WhenShown<frmPostIL>([&](frmPostIL& d) {
-    EXPECT_EQ(d.txtWeight->text(), "0.5");
-    d.txtService->setText(Q("רגיל"));
-    QTest::mouseClick(d.ChkOpenExcel, Qt::LeftButton);
-    desk_.answer = "/out/new.xlsx";
-    Press(d, "CmdDir");
-    Press(d, "cmdOK");
-  });
-  Press(*card_, "cmdPostDef");
-  for (auto [key, value] : {std::pair{"Service", "רגיל"},
-                            {"OpenExcel", "1"},
-                            {"Weight", "0.5"},
-                            {"FilePath", "/out/new.xlsx"}})
-    EXPECT_EQ(Stored(kPostILSection, key), value) << key;
-  WhenShown<frmPostIL>([&](frmPostIL& d) {
-    d.txtService->setText(Q("אחר"));
-    Press(d, "cmdCancel");
-  });
-  Press(*card_, "cmdPostDef");
-  EXPECT_EQ(Stored(kPostILSection, "Service"), "רגיל");
-}
-
 // Regression: the dispatch dialog took "abc" as the weight, and a stored value the panel
 // refused stopped its load with nothing shown, so the criteria after it looked chosen. The
 // dialog names the box and keeps what was typed; the start-up names the key and the value.
