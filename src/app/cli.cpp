@@ -4,16 +4,17 @@
 #include <sys/resource.h>
 #endif
 
-#include <charconv>
 #include <chrono>
 #include <cstdio>
 #include <filesystem>
 #include <fstream>
 #include <iostream>
+#include <map>
 #include <memory>
 #include <optional>
 #include <stdexcept>
 #include <string>
+#include <string_view>
 #include <utility>
 #include <vector>
 
@@ -26,30 +27,27 @@ namespace zdr {
 namespace {
 
 const char* const kUsage =
-    "usage: zdrlab labels|list|post [--company DIR] [--settings FILE] [--set NAME=VALUE]... "
+    "שימוש: zdrlab labels|list|post [--company DIR] [--settings FILE] [--set NAME=VALUE]... "
     "[--open] [--times]\n"
     "       zdrlab post [--check] [--strict] ...\n"
-    "       zdrlab labels --pdf FILE [--template ID] [--offset X,Y] [--scale X,Y] [options as "
-    "above]\n"
-    "       zdrlab calibrate --pdf FILE [--template ID] [--offset X,Y] [--scale X,Y] [--settings "
-    "FILE]\n"
-    "  labels  the label sheet zdrlab1.htm; with --pdf, the sheet as PDF on label stock ID\n"
-    "          (default: the stock the settings keep, a4-3x8-70x37; or a catalogue stock by\n"
-    "          brand and part, \"Avery L7160\"), moved by X,Y mm and grown by X,Y per mille\n"
-    "          (given, they replace the kept correction; a part not given is 0)\n"
-    "  calibrate  the calibration page of a label stock as PDF\n"
-    "  (each option's value may also follow an equals sign: --set=NAME=VALUE)\n"
-    "  list    the address list zdrlab2.htm\n"
-    "  post    the dispatch file zdpost1.csv and its workbook (FilePath), the rows' findings\n"
-    "          on its sheet \"בדיקה\"\n"
-    "  --check   post: only check the rows; the findings go to standard output as CSV\n"
-    "  --strict  post: any error finding gives exit code 3, and no file is written\n"
-    "Files are written in the folder named by Temp (else the system's temporary folder).\n"
-    "NAME is a key of section Params or PostIL of the settings, or one of txtFromRef, "
-    "txtToRef, ChkByItems, txtFromItmKey, txtToItmKey, txtFromItmSort, txtToItmSort, "
-    "txtStartFrom.\n"
-    "--times prints, at the end, the wall and processor seconds at which each status line was "
-    "reached.\n";
+    "       zdrlab labels --pdf FILE [--template ID] [--offset X,Y] [--scale X,Y] [...]\n"
+    "       zdrlab calibrate --pdf FILE [--template ID] [--offset X,Y] [--scale X,Y] "
+    "[--settings FILE]\n"
+    "  labels     דף המדבקות zdrlab1.htm; עם --pdf, המדבקות כ-PDF על תבנית המדבקות ID\n"
+    "             (בלי --template: התבנית השמורה בהגדרות, בהתחלה a4-3x8-70x37; או תבנית\n"
+    "             מהקטלוג לפי יצרן ומק\"ט, \"Avery L7160\"), בהיסט X,Y מ\"מ ובקנה מידה X,Y\n"
+    "             פרומיל (במקום התיקון השמור; חלק שלא ניתן הוא 0)\n"
+    "  calibrate  דף כיול של תבנית מדבקות, כ-PDF\n"
+    "  list       רשימת הכתובות zdrlab2.htm\n"
+    "  post       קובץ הדואר zdpost1.csv וגיליון העבודה שלו (FilePath), עם ממצאי הבדיקה\n"
+    "             בגיליון \"בדיקה\"\n"
+    "  --check    post: רק בדיקת השורות; הממצאים נכתבים לפלט התקני כ-CSV\n"
+    "  --strict   post: כל ממצא מסוג שגיאה מסתיים בקוד יציאה 3, ושום קובץ אינו נכתב\n"
+    "  --times    בסוף הריצה: שניות השעון והמעבד שבהן הגיעה כל שורת מצב\n"
+    "  ערך של אפשרות אפשר לתת גם אחרי סימן שוויון: --set=NAME=VALUE\n"
+    "הקבצים נכתבים לתיקייה ש-Temp מציין (אחרת לתיקייה הזמנית של המערכת).\n"
+    "NAME הוא מפתח של הסעיף Params או PostIL של ההגדרות, או אחד מ-txtFromRef, txtToRef, "
+    "ChkByItems, txtFromItmKey, txtToItmKey, txtFromItmSort, txtToItmSort, txtStartFrom.\n";
 
 // Wall and processor seconds since the command started, taken at every status line, for the
 // whole-process benchmark: it splits a command into the data load and the output this way.
@@ -101,61 +99,6 @@ class TimedConsoleSeam : public ConsoleSeam {
   StepClock* clock_;
 };
 
-// Settings whose control takes only some whole numbers: a value the control could not hold
-// is refused here, before anything runs, instead of being dropped or reaching the output.
-struct NumberCheck {
-  const char* name;
-  long low;
-  long high;
-  const char* allowed;  // shown when a value is refused
-};
-constexpr NumberCheck kNumberChecks[] = {
-    {"FileFormat", 0, 1, "0 (דואר ישראל) או 1 (הובלות עם שחר)"},
-    {"OpenExcel", 0, 1, "0 או 1"},
-    {"ChkByItems", 0, 2, "0, 1 או 2"},
-};
-
-// The value of NAME=VALUE as the control would take it: unchanged for free text, the whole
-// number in decimal for a checked setting. Throws std::runtime_error for a refused value.
-std::string CheckedValue(const std::string& name, const std::string& value) {
-  for (const NumberCheck& check : kNumberChecks) {
-    if (name != check.name) continue;
-    long number = 0;
-    const char* end = value.data() + value.size();
-    const auto [at, ec] = std::from_chars(value.data(), end, number);
-    if (value.empty() || ec != std::errc() || at != end || number < check.low ||
-        number > check.high) {
-      throw std::runtime_error(name + ": ערך לא חוקי \"" + value + "\" (" + check.allowed + ")");
-    }
-    return std::to_string(number);
-  }
-  return value;
-}
-
-// Panel controls whose values the settings store does not keep.
-bool SetUnstoredControl(Panel& p, const std::string& name, const std::string& value) {
-  if (name == "txtFromRef") {
-    p.txtFromRef = value;
-  } else if (name == "txtToRef") {
-    p.txtToRef = value;
-  } else if (name == "ChkByItems") {
-    p.ChkByItems = std::stoi(value);  // checked by CheckedValue
-  } else if (name == "txtFromItmKey") {
-    p.txtFromItmKey = value;
-  } else if (name == "txtToItmKey") {
-    p.txtToItmKey = value;
-  } else if (name == "txtFromItmSort") {
-    p.txtFromItmSort = value;
-  } else if (name == "txtToItmSort") {
-    p.txtToItmSort = value;
-  } else if (name == "txtStartFrom") {
-    p.txtStartFrom = value;
-  } else {
-    return false;
-  }
-  return true;
-}
-
 // Why the settings file cannot be used, or "" when it can be read.
 std::string SettingsFileProblem(const std::string& file) {
   namespace fs = std::filesystem;
@@ -171,181 +114,237 @@ std::string SettingsFileProblem(const std::string& file) {
   return "";
 }
 
-// Applies NAME=VALUE through the store's own routines: the current values are saved into a
-// scratch store, the one key is replaced there, and everything is loaded back, so a value
-// takes exactly the checks and conversions a stored one would.
-void ApplySet(Control& control, const std::string& name, const std::string& typed) {
-  const std::string value = CheckedValue(name, typed);
-  if (SetUnstoredControl(control.panel(), name, value)) return;
-  if (name == "ConnDataBase") {
-    control.state().companyPath = value;
-    return;
+// The commands, as bits of an option's mask.
+enum Command : unsigned { kLabels = 1, kList = 2, kPost = 4, kCalibrate = 8 };
+constexpr unsigned kAll = kLabels | kList | kPost | kCalibrate;
+
+constexpr std::pair<std::string_view, Command> kCommands[] = {
+    {"labels", kLabels}, {"list", kList}, {"post", kPost}, {"calibrate", kCalibrate}};
+
+// What an option takes after it.
+enum class Takes {
+  kNothing,
+  kValue,
+  kFileName,  // a file or folder: a word that is itself an option is not taken as one
+};
+
+struct OptionDef {
+  std::string_view name;
+  Takes takes;
+  unsigned commands;  // the commands it belongs to
+};
+
+constexpr OptionDef kOptions[] = {
+    {"--company", Takes::kFileName, kAll},
+    {"--settings", Takes::kFileName, kAll},
+    {"--set", Takes::kValue, kAll},
+    {"--open", Takes::kNothing, kAll},
+    {"--times", Takes::kNothing, kAll},
+    {"--check", Takes::kNothing, kPost},
+    {"--strict", Takes::kNothing, kPost},
+    {"--pdf", Takes::kFileName, kLabels | kCalibrate},
+    {"--template", Takes::kValue, kLabels | kCalibrate},
+    {"--offset", Takes::kValue, kLabels | kCalibrate},
+    {"--scale", Takes::kValue, kLabels | kCalibrate},
+};
+
+std::optional<Command> CommandOf(std::string_view word) {
+  for (const auto& [name, command] : kCommands) {
+    if (word == name) return command;
   }
-  MemorySettingsStore scratch;
-  SetGetRegParams(1, scratch, control.panel());
-  if (scratch.Has(kSettingsApp, "Params", name)) {
-    scratch.Save(kSettingsApp, "Params", name, value);
-    SetGetRegParams(2, scratch, control.panel());
-    return;
+  return std::nullopt;
+}
+
+// Wrong usage: what was wrong, in Hebrew.
+class UsageError : public std::runtime_error {
+ public:
+  using std::runtime_error::runtime_error;
+};
+
+// The options of one run, as given.
+struct Options {
+  std::map<std::string_view, std::string> values;               // the last value of each option
+  std::vector<std::pair<const SettingDef*, std::string>> sets;  // --set, in order
+  bool Has(std::string_view name) const { return values.count(name) != 0; }
+  std::optional<std::string> Value(std::string_view name) const {
+    const auto it = values.find(name);
+    return it == values.end() ? std::nullopt : std::optional(it->second);
   }
-  SetGetRegPostILDefs(1, scratch, control.postILSettings());
-  if (scratch.Has(kSettingsApp, "PostIL", name)) {
-    PostILSettings checked = control.postILSettings();
-    scratch.Save(kSettingsApp, "PostIL", name, value);
-    SetGetRegPostILDefs(2, scratch, checked);
-    control.postILSettings() = checked;
-    return;
+};
+
+// NAME=VALUE of --set, checked against the table of values before anything runs.
+std::pair<const SettingDef*, std::string> ParseSet(const std::string& kv) {
+  const auto eq = kv.find('=');
+  if (eq == std::string::npos || eq == 0) {
+    throw UsageError("--set מקבל NAME=VALUE, ולא \"" + kv + "\"");
   }
-  throw std::runtime_error("הגדרה לא מוכרת: " + name);
+  const std::string name = kv.substr(0, eq), value = kv.substr(eq + 1);
+  const SettingDef* def = FindSetting(name);
+  if (def == nullptr) throw UsageError("הגדרה לא מוכרת: " + name);
+  Panel panel;
+  PostILSettings postIL;
+  std::string path;
+  try {
+    ApplySetting(*def, value, {panel, postIL, path});
+  } catch (const SettingsValueError& e) {
+    throw UsageError(std::string("--set: ") + e.what());
+  }
+  return {def, value};
+}
+
+Options ParseOptions(const std::vector<std::string>& args, Command command) {
+  Options options;
+  for (size_t i = 1; i < args.size(); ++i) {
+    // "--name=value" is "--name value".
+    std::string word = args[i];
+    std::optional<std::string> inlineValue;
+    if (const auto eq = word.find('='); word.starts_with("--") && eq != std::string::npos) {
+      inlineValue = word.substr(eq + 1);
+      word.resize(eq);
+    }
+    const OptionDef* def = nullptr;
+    for (const OptionDef& o : kOptions) {
+      if (o.name == word) def = &o;
+    }
+    if (def == nullptr) throw UsageError("אפשרות לא מוכרת: " + word);
+    if ((def->commands & command) == 0) {
+      throw UsageError("האפשרות " + word + " אינה שייכת לפקודה " + args[0]);
+    }
+    std::string value;
+    if (def->takes == Takes::kNothing) {
+      if (inlineValue) throw UsageError("האפשרות " + word + " אינה מקבלת ערך");
+    } else if (inlineValue) {
+      value = *inlineValue;
+    } else if (i + 1 < args.size()) {
+      value = args[++i];
+    } else {
+      throw UsageError("חסר ערך לאפשרות " + word);
+    }
+    if (def->takes == Takes::kFileName) {
+      if (value.empty()) throw UsageError("חסר שם של קובץ או תיקייה לאפשרות " + word);
+      if (value.starts_with("-")) {
+        throw UsageError("חסר שם של קובץ או תיקייה לאפשרות " + word + ": \"" + value +
+                         "\" הוא אפשרות ולא שם (שם שמתחיל במקף כותבים ./" + value + ")");
+      }
+    }
+    if (word == "--set") {
+      options.sets.push_back(ParseSet(value));
+    } else {
+      options.values[def->name] = value;
+    }
+  }
+  if (command == kCalibrate && !options.Has("--pdf")) {
+    throw UsageError("הפקודה calibrate צריכה --pdf FILE");
+  }
+  if ((options.Has("--template") || options.Has("--offset") || options.Has("--scale")) &&
+      !options.Has("--pdf")) {
+    throw UsageError("--template, --offset ו---scale באים עם --pdf FILE");
+  }
+  if (const auto xy = options.Value("--offset"); xy && !ParseStockOffset(*xy)) {
+    throw UsageError("--offset מקבל X,Y במ\"מ, כל אחד בין -10 ל-10 בצעדים של 0.1, ולא " + *xy);
+  }
+  if (const auto xy = options.Value("--scale"); xy && !ParseStockScale(*xy)) {
+    throw UsageError("--scale מקבל X,Y בפרומיל, כל אחד בין -100 ל-100 בצעדים של 0.1, ולא " + *xy);
+  }
+  return options;
 }
 
 }  // namespace
 
 bool IsCliCommand(const std::string& word) {
-  return word == "labels" || word == "list" || word == "post" || word == "calibrate";
+  return CommandOf(word).has_value();
 }
 
 int RunCli(const std::vector<std::string>& args, SettingsStore& defaultStore) {
-  if (args.empty() || !IsCliCommand(args[0])) {
+  const auto usage = [](const std::string& what) {
+    if (!what.empty()) std::fprintf(stderr, "zdrlab: %s\n", what.c_str());
     std::fputs(kUsage, stderr);
     return 2;
+  };
+  const std::optional<Command> command = args.empty() ? std::nullopt : CommandOf(args[0]);
+  if (!command) return usage(args.empty() ? "" : "פקודה לא מוכרת: " + args[0]);
+  Options options;
+  try {
+    options = ParseOptions(args, *command);
+  } catch (const UsageError& e) {
+    return usage(e.what());
   }
-  const std::string command = args[0];
-  std::optional<std::string> company, settingsFile;
-  std::vector<std::pair<std::string, std::string>> sets;
-  bool open = false, check = false, strict = false, times = false;
-  std::optional<std::string> pdf, stockId;
-  std::optional<StockOffset> offset, scale;
-  for (size_t i = 1; i < args.size(); ++i) {
-    // "--name=value" is "--name value".
-    std::string a = args[i];
-    std::optional<std::string> inlineValue;
-    if (const auto eq = a.find('='); a.rfind("--", 0) == 0 && eq != std::string::npos) {
-      inlineValue = a.substr(eq + 1);
-      a.resize(eq);
-    }
-    auto needValue = [&](const char* opt) -> std::string {
-      if (inlineValue) return *inlineValue;
-      if (i + 1 >= args.size()) {
-        throw std::invalid_argument(std::string(opt) + " needs a value");
-      }
-      return args[++i];
-    };
-    try {
-      if (a == "--company") {
-        company = needValue("--company");
-      } else if (a == "--settings") {
-        settingsFile = needValue("--settings");
-      } else if (a == "--set") {
-        const std::string kv = needValue("--set");
-        const auto eq = kv.find('=');
-        if (eq == std::string::npos || eq == 0)
-          throw std::invalid_argument("--set takes NAME=VALUE, not " + kv);
-        sets.emplace_back(kv.substr(0, eq), kv.substr(eq + 1));
-      } else if (a == "--open" && !inlineValue) {
-        open = true;
-      } else if ((a == "--check" || a == "--strict") && command == "post" && !inlineValue) {
-        (a == "--check" ? check : strict) = true;
-      } else if (a == "--pdf" && (command == "labels" || command == "calibrate")) {
-        pdf = needValue("--pdf");
-        if (pdf->empty()) throw std::invalid_argument("--pdf needs a file name");
-      } else if (a == "--template" && (command == "labels" || command == "calibrate")) {
-        stockId = needValue("--template");
-      } else if (a == "--offset" && (command == "labels" || command == "calibrate")) {
-        const std::string& xy = needValue("--offset");
-        offset = ParseStockOffset(xy);
-        if (!offset)
-          throw std::invalid_argument(
-              "--offset takes X,Y in mm, each -10 to 10 in steps of 0.1, not " + xy);
-      } else if (a == "--scale" && (command == "labels" || command == "calibrate")) {
-        const std::string& xy = needValue("--scale");
-        scale = ParseStockScale(xy);
-        if (!scale)
-          throw std::invalid_argument(
-              "--scale takes X,Y per mille, each -100 to 100 in steps of 0.1, not " + xy);
-      } else if (a == "--times" && !inlineValue) {
-        times = true;
-      } else {
-        throw std::invalid_argument("unknown option " + a);
-      }
-    } catch (const std::invalid_argument& e) {
-      std::fprintf(stderr, "zdrlab: %s\n%s", e.what(), kUsage);
-      return 2;
-    }
-  }
+  // Wrong usage from here on is about a file or a value, not the words: no synopsis.
+  const auto refuse = [](const std::string& what) {
+    std::fprintf(stderr, "zdrlab: %s\n", what.c_str());
+    return 2;
+  };
 
+  const std::optional<std::string> settingsFile = options.Value("--settings");
   if (settingsFile) {
     // A missing or unreadable file would silently give the default criteria.
     if (const std::string problem = SettingsFileProblem(*settingsFile); !problem.empty()) {
-      std::fprintf(stderr, "zdrlab: %s\n", problem.c_str());
-      return 2;
+      return refuse(problem);
     }
   }
-  if (command == "calibrate" && !pdf) {
-    std::fprintf(stderr, "zdrlab: calibrate needs --pdf FILE\n%s", kUsage);
-    return 2;
-  }
-  if ((stockId || offset || scale) && !pdf) {
-    std::fprintf(stderr, "zdrlab: --template, --offset and --scale go with --pdf FILE\n%s", kUsage);
-    return 2;
-  }
-
   std::unique_ptr<SettingsStore> fileStore;
   if (settingsFile) fileStore = std::make_unique<QtSettingsStore>(*settingsFile);
   SettingsStore& store = fileStore ? *fileStore : defaultStore;
 
+  const bool times = options.Has("--times");
   StepClock clock;
-  TimedConsoleSeam ui(stderr, open, times ? &clock : nullptr);
+  TimedConsoleSeam ui(stderr, options.Has("--open"), times ? &clock : nullptr);
   Control control(store, ui);
-  control.Initialize();
-  if (company) control.state().companyPath = *company;
-  for (const auto& [name, value] : sets) {
-    try {
-      ApplySet(control, name, value);
-    } catch (const std::exception& e) {
-      ui.ShowMessage(e.what(), kTitleError, MsgIcon::Critical);
-      return 2;
+  // A stored value the panel refuses would drop the criteria after it: the run would choose
+  // other recipients than the settings say.
+  if (const auto refused = control.Initialize(); !refused.empty()) {
+    const std::string where = settingsFile ? *settingsFile : store.Location();
+    for (const SettingsValueError& e : refused) refuse("בקובץ ההגדרות " + where + ": " + e.what());
+    return 2;
+  }
+  if (const auto company = options.Value("--company")) control.state().companyPath = *company;
+  SettingTargets targets{control.panel(), control.postILSettings(), control.state().companyPath};
+  for (const auto& [def, value] : options.sets) ApplySetting(*def, value, targets);
+
+  const std::optional<std::string> pdf = options.Value("--pdf");
+  const std::string stockId = options.Value("--template").value_or("");
+  std::optional<StockOffset> offset;
+  if (const auto xy = options.Value("--offset")) offset = ParseStockOffset(*xy);
+  // Given, the offset and the scale replace the kept correction together.
+  if (const auto xy = options.Value("--scale")) {
+    const StockOffset scale = *ParseStockScale(*xy);
+    if (!offset) offset = StockOffset{};
+    offset->scaleX = scale.scaleX;
+    offset->scaleY = scale.scaleY;
+  }
+  if (!stockId.empty()) {
+    if (const std::string problem = LabelStockChoiceProblem(store, stockId); !problem.empty()) {
+      return refuse(problem);
     }
   }
 
-  if (check) {
-    if (!control.CmdCheckPostIL() || ui.failures() > 0) return 1;
+  const bool strict = options.Has("--strict");
+  if (options.Has("--check")) {
+    if (!control.CmdCheckPostIL() || !control.lastLoad().Complete()) return 1;
     std::cout << FindingsCsv(control.lastPreflight()) << std::flush;
     return strict && control.lastPreflight().errors > 0 ? 3 : 0;
   }
-  if (stockId && !FindLabelStock(store, *stockId)) {
-    // The shipped and the user's stocks are named; the catalogue's are too many to list.
-    std::string known;
-    for (const LabelStock& s : AvailableLabelStocks(store)) known += " " + s.id;
-    std::fprintf(stderr, "zdrlab: %s. התבניות:%s, ותבניות הקטלוג לפי יצרן ומק\"ט\n",
-                 LabelStockLookupProblem(store, *stockId).c_str(), known.c_str());
-    return 2;
-  }
-  if (scale) {
-    if (!offset) offset = StockOffset{};
-    offset->scaleX = scale->scaleX;
-    offset->scaleY = scale->scaleY;
-  }
 
   std::string produced;
-  if (command == "calibrate") {
-    produced = control.CmdCalibrate(*pdf, stockId.value_or(""), offset);
-  } else if (command == "labels" && pdf) {
-    produced = control.CmdLabPdf(*pdf, stockId.value_or(""), offset);
-  } else if (command == "labels") {
+  if (*command == kCalibrate) {
+    produced = control.CmdCalibrate(*pdf, stockId, offset);
+  } else if (*command == kLabels && pdf) {
+    produced = control.CmdLabPdf(*pdf, stockId, offset);
+  } else if (*command == kLabels) {
     produced = control.CmdLabPrev();
-  } else if (command == "list") {
+  } else if (*command == kList) {
     produced = control.CmdPreview();
   } else {
     produced = control.CmdBuildPostIL(strict);
-    if (produced.empty() && ui.failures() == 0 && strict && control.lastPreflight().errors > 0) {
+    if (produced.empty() && control.lastLoad().Complete() && strict &&
+        control.lastPreflight().errors > 0) {
       // Refused: the findings are the only output.
       std::cout << FindingsCsv(control.lastPreflight()) << std::flush;
       return 3;
     }
   }
   if (times) clock.Print(stderr);
-  if (produced.empty() || ui.failures() > 0) return 1;
+  if (produced.empty() || !control.lastLoad().Complete()) return 1;
   std::cout << produced << std::endl;
   return 0;
 }

@@ -16,7 +16,10 @@ bool IsCliCommand(const std::string& word);
 // Runs one command with the arguments after the program name. `store` is used when no
 // --settings FILE is given. Prints the output's path on standard output and everything else
 // on standard error. Returns the process exit code: 0 when the command produced its file,
-// 1 when it failed, 2 for wrong usage.
+// 1 when it failed (the command's own failure, or a data load that did not read all it
+// should), 2 for wrong usage (said in Hebrew): an unknown word, an option of another command,
+// an option word where a file name belongs, a value the table of values refuses by --set or
+// stored in the settings, an unusable label stock.
 //
 // `post --check` writes no file: it prints the dispatch checks' findings on standard output
 // as CSV (FindingsCsv) and returns 0. `post --strict` returns 3 when a check found an error:

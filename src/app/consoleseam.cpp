@@ -52,7 +52,6 @@ void ConsoleSeam::EndProgressLine() {
 
 void ConsoleSeam::ShowMessage(std::string_view text, std::string_view title, MsgIcon icon) {
   EndProgressLine();
-  if (IsFailureMessage(title, icon)) ++failures_;
   std::fprintf(err_, "[%s] %.*s: %.*s\n", IconWord(icon), static_cast<int>(title.size()),
                title.data(), static_cast<int>(text.size()), text.data());
   std::fflush(err_);

@@ -22,9 +22,6 @@ class ConsoleSeam : public UserSeam {
   bool OpenInBrowser(const std::string& path) override;
   bool OpenInSpreadsheet(const std::string& path) override;
 
-  // Number of failures shown (critical icon, or a fault or error title).
-  int failures() const { return failures_; }
-
  private:
   void EndProgressLine();
 
@@ -33,7 +30,6 @@ class ConsoleSeam : public UserSeam {
   bool tty_;
   int lastPercent_ = -1;
   bool progressShown_ = false;
-  int failures_ = 0;
 };
 
 // Hands a file to the desktop's program for its type (xdg-open, open, or the shell's open

@@ -44,13 +44,15 @@ int main(int argc, char** argv) {
     if (args[i] == "--help" || args[i] == "-h") {
       zdr::QtSettingsStore store;
       zdr::RunCli({}, store);
-      std::fputs("With no command, zdrlab opens its window: zdrlab [--company DIR]\n", stderr);
+      std::fputs("בלי פקודה zdrlab פותח את החלון שלו: zdrlab [--company DIR]\n", stderr);
       return 0;
     }
     if (args[i] == "--company" && i + 1 < args.size()) {
       company = args[++i];
     } else {
-      std::fprintf(stderr, "zdrlab: unknown option %s (see zdrlab --help)\n", args[i].c_str());
+      std::fprintf(stderr, "zdrlab: %s: %s (ראו zdrlab --help)\n",
+                   args[i].starts_with("-") ? "אפשרות לא מוכרת" : "פקודה לא מוכרת",
+                   args[i].c_str());
       return 2;
     }
   }
@@ -64,7 +66,7 @@ int main(int argc, char** argv) {
   }
   return zdr::gui::RunMainWindow(argc, argv, company);
 #else
-  std::fputs("zdrlab was built without its window; give a command (labels, list, post).\n", stderr);
+  std::fputs("zdrlab נבנה בלי החלון שלו; יש לתת פקודה (labels, list, post, calibrate).\n", stderr);
   return 2;
 #endif
 }

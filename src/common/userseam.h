@@ -20,13 +20,6 @@ inline constexpr std::string_view kTitleError = "שגיאה";
 inline constexpr std::string_view kTitleMessage = "הודעה";
 inline constexpr std::string_view kTitleAttention = "שימו לב";
 
-// A message that says a command did not do all it should: a critical icon, or a fault or
-// error title (some importers report with the information icon under their own title).
-inline bool IsFailureMessage(std::string_view title, MsgIcon icon) {
-  return icon == MsgIcon::Critical || title.rfind(kTitleFault, 0) == 0 ||
-         title.rfind(kTitleError, 0) == 0;
-}
-
 // Width of the progress frame in the core's units. The fill runs from 0 to this width;
 // a front end scales it to its own widget.
 inline constexpr int kProgressFrameWidth = 3000;

@@ -8,6 +8,7 @@
 
 #include "control/control.h"
 #include "control/dataload.h"
+#include "control/settings.h"
 #include "engine/engine.h"
 #include "output/output.h"
 #include "select/select.h"
@@ -26,48 +27,47 @@ std::string TempFile(const char* name) {
   return (TempFolder() / name).string();
 }
 
-// Passes everything on to the person's seam and notes whether a failure was shown, so that
-// a load that went wrong does not replace the user's workbook.
-class FailureWatch : public UserSeam {
- public:
-  explicit FailureWatch(UserSeam& ui) : ui_(ui) {}
-  void ShowMessage(std::string_view text, std::string_view title, MsgIcon icon) override {
-    if (IsFailureMessage(title, icon)) failed_ = true;
-    ui_.ShowMessage(text, title, icon);
-  }
-  bool AskYesNo(std::string_view text, std::string_view title, MsgIcon icon) override {
-    return ui_.AskYesNo(text, title, icon);
-  }
-  void SetStatus(std::string_view text) override { ui_.SetStatus(text); }
-  void SetProgress(int fillWidth) override { ui_.SetProgress(fillWidth); }
-  void YieldToEvents() override { ui_.YieldToEvents(); }
-  bool OpenInBrowser(const std::string& path) override { return ui_.OpenInBrowser(path); }
-  bool OpenInSpreadsheet(const std::string& path) override { return ui_.OpenInSpreadsheet(path); }
-  bool failed() const { return failed_; }
-
- private:
-  UserSeam& ui_;
-  bool failed_ = false;
-};
-
 void OpenPage(UserSeam& ui, const std::string& path) {
   if (!ui.OpenInBrowser(path)) throw CommandError("לא ניתן לפתוח את הדפדפן על הקובץ " + path);
 }
 
 }  // namespace
 
-void Control::ReadAllData(bool pAsIs) {
-  zdr::ReadAllData(pAsIs, panel_, state_, docTypes_, ui_);
+LoadResult Control::ReadAllData(bool pAsIs) {
+  lastLoad_ = LoadResult{false, 1};  // what stays when the load ends by an error
+  lastLoad_ = zdr::ReadAllData(pAsIs, panel_, state_, docTypes_, ui_);
+  return lastLoad_;
+}
+
+std::vector<std::string> Control::CompanyFolders() {
+  std::vector<std::string> folders{state_.companyPath};
+  try {
+    folders.push_back(
+        store_.Get(kSettingsApp, kParamsSection, kConnDataBaseKey, DefaultConnDataBase()));
+  } catch (const std::exception&) {
+  }
+  return folders;
+}
+
+bool Control::TargetRefused(const std::string& path, TargetKind kind) {
+  try {
+    CheckOutputTarget(path, kind, CompanyFolders());
+    return false;
+  } catch (const OutputError& e) {
+    ui_.ShowMessage(e.what(), kTitleError, MsgIcon::Critical);
+    return true;
+  }
 }
 
 // The label sheet and the address list: the data load as-is, then the page in the temporary
-// folder, opened in a new browser window.
+// folder, opened in a new browser window. A load that could not create its database has
+// shown why, and nothing follows it; a load whose importers failed still gives its page.
 template <typename WritePage>
 static std::string RunPageCommand(Control& control, const char* fileName, WritePage writePage) {
   UserSeam& ui = control.ui();
   try {
     const auto lock = LockWorkFiles();
-    control.ReadAllData(true);
+    if (!control.ReadAllData(true).databaseUsable) return "";
     ui.YieldToEvents();
     ui.SetStatus("מכין רשימה");
     const std::string path = TempFile(fileName);
@@ -82,6 +82,7 @@ static std::string RunPageCommand(Control& control, const char* fileName, WriteP
 }
 
 std::string Control::CmdLabPrev() {
+  lastLoad_ = {true, 0};
   if (labelPdf_.Output == 1) return CmdLabPdf(TempFile("zdrlab1.pdf"));
   return RunPageCommand(*this, "zdrlab1.htm", [this](const std::string& path) {
     CreateLabFile(path, state_.workDbPath, panel_, docTypes_, state_.selectDbPath, labels_, ui_);
@@ -89,6 +90,7 @@ std::string Control::CmdLabPrev() {
 }
 
 std::string Control::CmdPreview() {
+  lastLoad_ = {true, 0};
   return RunPageCommand(*this, "zdrlab2.htm", [this](const std::string& path) {
     CreateHTML(path, state_.workDbPath, panel_, docTypes_, state_.selectDbPath, ui_);
   });
@@ -107,31 +109,27 @@ db::Snapshot Control::RunPostILChecks() {
       db::Database::Open(state_.workDbPath)
           .OpenSnapshot(BuildRecipientsStatement(panel_, docTypes_, state_.selectDbPath),
                         db::SnapshotKind::Forward);
-  preflight_ = RunPreflight(recipients, postIL_.FileFormat, panel_, docTypes_, ui_);
+  preflight_ = RunPreflight(recipients, postIL_.FileFormat, panel_, docTypes_, ui_, postIL_);
   return recipients;
 }
 
 // The dispatch file. The workbook named by FilePath is checked before anything is loaded,
-// and replaced only by a complete workbook from a load that reported no failure: until then
-// the old file stays as it was.
+// and replaced only by a complete workbook from a load whose every step was done: until
+// then the old file stays as it was.
 std::string Control::CmdBuildPostIL(bool strict) {
   preflight_ = {};
   lastPostCsv_.clear();
   lastPostWorkbook_.clear();
+  lastLoad_ = {true, 0};
   try {
     if (postIL_.FilePath.empty()) {
       ui_.ShowMessage("לא הוגדר קובץ פלט", kTitleError, MsgIcon::Critical);
       return "";
     }
-    try {
-      CheckWorkbookTarget(postIL_.FilePath, state_.companyPath);
-    } catch (const OutputError& e) {
-      ui_.ShowMessage(e.what(), kTitleError, MsgIcon::Critical);
-      return "";
-    }
+    if (TargetRefused(postIL_.FilePath, TargetKind::kWorkbook)) return "";
     const auto lock = LockWorkFiles();
-    FailureWatch watch(ui_);
-    zdr::ReadAllData(false, panel_, state_, docTypes_, watch);
+    const LoadResult load = ReadAllData(false);
+    if (!load.databaseUsable) return "";
     ui_.YieldToEvents();
     db::Snapshot recipients = RunPostILChecks();
     if (strict && preflight_.errors > 0) {
@@ -140,14 +138,14 @@ std::string Control::CmdBuildPostIL(bool strict) {
     }
     ui_.SetStatus("מכין קובץ");
     const std::string csv = TempFile("zdpost1.csv");
-    CreateCSV(csv, recipients, postIL_.FileFormat, postIL_, watch);
+    CreateCSV(csv, recipients, postIL_.FileFormat, postIL_, ui_);
     recipients.Close();
-    if (watch.failed()) {
+    if (!load.Complete()) {
       throw CommandError("הקובץ " + postIL_.FilePath +
                          " לא נכתב מחדש, כי קריאת הנתונים לא הושלמה (ראו את ההודעה הקודמת)");
     }
     ui_.YieldToEvents();
-    ConvertToExcel(csv, postIL_.FilePath, postIL_.OpenExcel == 1, ui_, state_.companyPath,
+    ConvertToExcel(csv, postIL_.FilePath, postIL_.OpenExcel == 1, ui_, CompanyFolders(),
                    preflight_.findings);
     lastPostCsv_ = csv;
     lastPostWorkbook_ = postIL_.FilePath;
@@ -161,9 +159,10 @@ std::string Control::CmdBuildPostIL(bool strict) {
 
 bool Control::CmdCheckPostIL() {
   preflight_ = {};
+  lastLoad_ = {true, 0};
   try {
     const auto lock = LockWorkFiles();
-    ReadAllData(false);
+    if (!ReadAllData(false).databaseUsable) return false;
     ui_.YieldToEvents();
     RunPostILChecks();
     ui_.SetStatus(WithCounts("הבדיקה הסתיימה", preflight_));
@@ -179,7 +178,7 @@ bool Control::OpenPostILFindings() {
   if (lastPostWorkbook_.empty() || preflight_.findings.empty()) return false;
   try {
     const auto lock = LockWorkFiles();  // the dispatch file is read again from the temp folder
-    ConvertToExcel(lastPostCsv_, lastPostWorkbook_, true, ui_, state_.companyPath,
+    ConvertToExcel(lastPostCsv_, lastPostWorkbook_, true, ui_, CompanyFolders(),
                    preflight_.findings, true);
     return true;
   } catch (const std::exception& e) {

@@ -13,7 +13,8 @@ Control::Control(SettingsStore& store, UserSeam& ui) : store_(store), ui_(ui) {}
 
 Control::~Control() = default;
 
-void Control::Initialize() {
+std::vector<SettingsValueError> Control::Initialize() {
+  std::vector<SettingsValueError> refused;
   // Every step may fail on its own; the panel always comes up.
   try {
     state_.companyPath = store_.Get(kSettingsApp, "Params", "ConnDataBase", DefaultConnDataBase());
@@ -23,6 +24,8 @@ void Control::Initialize() {
   panel_.cmbDocType = 0;
   try {
     SetGetRegParams(2, store_, panel_);
+  } catch (const SettingsValueError& e) {
+    refused.push_back(e);  // the keys from this one on keep their designed values
   } catch (const std::exception&) {
   }
   try {
@@ -30,7 +33,7 @@ void Control::Initialize() {
   } catch (const std::exception&) {
   }
   try {
-    SetGetRegPostILDefs(2, store_, postIL_);
+    for (SettingsValueError& e : SetGetRegPostILDefs(2, store_, postIL_)) refused.push_back(e);
   } catch (const std::exception&) {
   }
   try {
@@ -38,6 +41,7 @@ void Control::Initialize() {
   } catch (const std::exception&) {
   }
   state_.selectDbPath.clear();
+  return refused;
 }
 
 void Control::CmdDef() {

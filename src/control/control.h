@@ -7,17 +7,29 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <vector>
 
 #include "common/panel.h"
 #include "common/userseam.h"
+#include "control/settings.h"
 #include "engine/engine.h"
 #include "hostfile/doctypes.h"
 #include "output/outputdefs.h"
 #include "output/preflight.h"
+#include "output/targetfile.h"
 
 namespace zdr {
 
-class SettingsStore;
+// What a data load did. Each step that could not do all it should (the database creation, an
+// importer, one batch file) has shown its own message and counts here; callers decide from
+// this, never from the messages shown.
+struct LoadResult {
+  // False when the load ended because the working database could not be created or a failed
+  // step broke it (a full disk): that step's message is the last, and no output follows.
+  bool databaseUsable = false;
+  int failures = 0;
+  bool Complete() const { return failures == 0; }
+};
 
 // State the control keeps for its lifetime.
 struct ControlState {
@@ -35,14 +47,20 @@ class Control {
 
   // Start-up: the company path, the document types, the panel, the label appearance and
   // the dispatch settings from the store; clears the account-selection database path.
-  // A failing step is skipped and the next one runs.
-  void Initialize();
+  // A failing step is skipped and the next one runs. Returns the stored values the panel
+  // and the dispatch settings refused, in order (RefusedSettingsMessage words them): the
+  // panel's load stopped at its first; a dispatch setting keeps its default. Shows nothing.
+  std::vector<SettingsValueError> Initialize();
 
   // CmdDef: saves the panel to the store, ignoring errors.
   void CmdDef();
 
-  // The data load every output runs first.
-  void ReadAllData(bool pAsIs);
+  // The data load every output runs first; its result is also kept as lastLoad().
+  LoadResult ReadAllData(bool pAsIs);
+
+  // The data load of the last command; a command that loads nothing (or has not run) leaves
+  // a complete one. The command line's exit code reads it.
+  const LoadResult& lastLoad() const { return lastLoad_; }
 
   // The three output commands. Each returns the path of the file it produced, or an empty
   // string when it failed (the failure has been shown through the seam).
@@ -96,6 +114,12 @@ class Control {
   UserSeam& ui() { return ui_; }
 
  private:
+  // The company folders no output may be written into: the one in use and the one the
+  // settings keep.
+  std::vector<std::string> CompanyFolders();
+  // Checks a target with CheckOutputTarget; a refusal is shown under "שגיאה" and returns true.
+  bool TargetRefused(const std::string& path, TargetKind kind);
+
   // The recipients through RunPreflight into preflight_. Returns them, open, for the
   // dispatch file to read again.
   db::Snapshot RunPostILChecks();
@@ -110,6 +134,7 @@ class Control {
   PreflightResult preflight_;
   std::string lastPostCsv_, lastPostWorkbook_;  // of the last dispatch command that wrote
   LabelPdfSettings labelPdf_;
+  LoadResult lastLoad_{true, 0};
 };
 
 }  // namespace zdr

@@ -1,28 +1,61 @@
 #include "control/dataload.h"
 
 #include <cstdint>
+#include <exception>
+#include <filesystem>
 #include <stdexcept>
 
+#include "engine/engine.h"
 #include "import/importers.h"
 #include "select/select.h"
 #include "workdb/schema.h"
 
 namespace zdr {
+namespace {
 
-void ReadAllData(bool pAsIs, Panel& panel, ControlState& state, const DocTypeTable& docTypes,
-                 UserSeam& ui) {
+// Whether the working database still opens. A step that failed on a full disk leaves the
+// journal-less working database broken; every later step would only report that again. A
+// broken one is removed, which gives the disk its room back.
+bool StillUsable(std::string& dbFile) {
+  try {
+    db::Database::Open(dbFile).Close();
+    return true;
+  } catch (const std::exception&) {
+    std::error_code ec;
+    std::filesystem::remove(dbFile, ec);
+    dbFile.clear();
+    return false;
+  }
+}
+
+}  // namespace
+
+LoadResult ReadAllData(bool pAsIs, Panel& panel, ControlState& state, const DocTypeTable& docTypes,
+                       UserSeam& ui) {
+  LoadResult result;
   ui.SetStatus(kStatusInitDb);
-  // An empty path is stored as it is; the importers then report that they cannot open it.
   state.workDbPath = CreateWorkDB(state.selectDbPath, ui);
-  const std::string& dbFile = state.workDbPath;
+  std::string& dbFile = state.workDbPath;
+  result.databaseUsable = !dbFile.empty();
+  if (!result.databaseUsable) {
+    result.failures = 1;
+    return result;
+  }
+  // Counts a step that failed; false when the load cannot go on.
+  const auto goesOn = [&](bool done) {
+    if (done) return true;
+    ++result.failures;
+    result.databaseUsable = StillUsable(dbFile);
+    return result.databaseUsable;
+  };
 
   ui.SetStatus(kStatusAccounts);
-  ReadACT(state.companyPath, dbFile, true, pAsIs, panel, ui);
+  if (!goesOn(ReadACT(state.companyPath, dbFile, true, pAsIs, panel, ui))) return result;
 
   if (Panel::On(panel.ChkDates) && panel.cmbDocType >= 0) {
     if (panel.cmbDocType == kCashReceiptsRow) {
       ui.SetStatus(kStatusCash);
-      ReadCash(state.companyPath, dbFile, pAsIs, panel, ui);
+      if (!goesOn(ReadCash(state.companyPath, dbFile, pAsIs, panel, ui) != 0)) return result;
     } else {
       ui.SetStatus(kStatusDocuments);
       if (panel.cmbDocType > UINT8_MAX) {
@@ -30,25 +63,36 @@ void ReadAllData(bool pAsIs, Panel& panel, ControlState& state, const DocTypeTab
                                 " אינו בטבלת סוגי המסמכים");
       }
       const bool byItems = Panel::On(panel.ChkByItems);
-      ReadStock(1, state.companyPath, panel.TxtFromDate, panel.TxtToDate, dbFile,
-                static_cast<uint8_t>(panel.cmbDocType), byItems, pAsIs, panel, docTypes, ui);
+      if (!goesOn(ReadStock(1, state.companyPath, panel.TxtFromDate, panel.TxtToDate, dbFile,
+                            static_cast<uint8_t>(panel.cmbDocType), byItems, pAsIs, panel, docTypes,
+                            ui) != 0)) {
+        return result;
+      }
       if (byItems) {
         ui.SetStatus(kStatusItems);
-        ReadItem(state.companyPath, dbFile, panel, ui);
+        if (!goesOn(ReadItem(state.companyPath, dbFile, panel, ui))) return result;
       }
     }
   }
 
   if (UseTransactions(panel)) {
     ui.SetStatus(kStatusLedger);
-    ReadTransactions(state.companyPath, dbFile, pAsIs, panel, ui);
+    if (!goesOn(ReadTransactions(state.companyPath, dbFile, pAsIs, panel, ui) != 0)) {
+      return result;
+    }
     if (Panel::On(panel.chkReadTempTrans)) {
       ui.SetStatus(kStatusBatches);
-      ReadAllTempTrans(state.companyPath, dbFile, pAsIs, panel, ui);
+      const int failed = ReadAllTempTrans(state.companyPath, dbFile, pAsIs, panel, ui);
+      result.failures += failed;
+      if (failed > 0 && !StillUsable(dbFile)) {
+        result.databaseUsable = false;
+        return result;
+      }
     }
   }
 
   ui.SetStatus(kStatusLoaded);
+  return result;
 }
 
 }  // namespace zdr

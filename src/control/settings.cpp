@@ -11,6 +11,7 @@
 
 #include "control/stockcatalogue.h"
 #include "hostfile/doctypes.h"
+#include "output/preflight.h"
 
 namespace zdr {
 
@@ -37,75 +38,109 @@ std::optional<long> ParseInRange(std::string_view text, long low, long high) {
   return value;
 }
 
-struct ParamEntry {
-  std::string key;
-  ControlValueRef value;
-  uint8_t kind;
-  std::string_view defaultValue;
-};
+using Ref = std::variant<std::string*, int*, int16_t*>;
 
-// The key table of section Params, in order, bound to one panel.
-std::vector<ParamEntry> ParamsTable(Panel& p) {
-  const auto text = [](std::string& t) { return ControlValueRef::Text(t); };
-  const auto check = [](int& v) { return ControlValueRef::CheckValue(v); };
-  const auto list = [](int& i, int size) { return ControlValueRef::ListIndex(i, size); };
+// Where a value lives, as a function the table can hold.
+#define ZDR_AT(expr) [](SettingTargets& t, [[maybe_unused]] int i) -> Ref { return &(expr); }
+
+std::vector<SettingDef> BuildSettingsTable() {
   constexpr std::string_view kNone = "";
   constexpr std::string_view kZero = "0";
-  constexpr std::string_view kStar = "*";
   constexpr std::string_view kFirstDate = "01/01/1980";
   constexpr std::string_view kLastDate = "01/01/2025";
+  constexpr auto kText = ValueRule::kText;
+  constexpr auto kCheck = ValueRule::kCheck;
+  constexpr auto kList = ValueRule::kList;
+  constexpr auto kParams = Stored::kByParams;
 
-  std::vector<ParamEntry> t;
-  t.reserve(53);
-  t.push_back({"UseCatCode", check(p.ChkCatCode), kKindCheck, kZero});
-  t.push_back({"FromSort", text(p.txtFromSort), kKindText, kNone});
-  t.push_back({"ToSort", text(p.txtToSort), kKindText, kNone});
-  t.push_back({"UseAccKey", check(p.ChkAccKey), kKindCheck, kZero});
-  for (int i = 1; i <= 4; ++i) {
-    t.push_back({"CutOff" + std::to_string(i), text(p.CutOff[i]), kKindText, kStar});
-  }
-  t.push_back({"UseCutOff", check(p.chkCutOff), kKindCheck, kZero});
-  t.push_back({"FromCrd", text(p.TxtFromCrd), kKindText, kNone});
-  t.push_back({"ToCrd", text(p.TxtToCrd), kKindText, kNone});
-  t.push_back({"UseCity", check(p.ChkCity), kKindCheck, kZero});
-  t.push_back({"City", text(p.TxtCity), kKindText, kNone});
-  t.push_back({"UsePhone", check(p.ChkPhone), kKindCheck, kZero});
-  t.push_back({"Phone", text(p.txtPhone), kKindText, kNone});
-  t.push_back({"UseAgent", check(p.ChkAgent), kKindCheck, kZero});
-  t.push_back({"FromAgent", text(p.txtAgent), kKindText, kNone});
-  t.push_back({"ToAgent", text(p.txtToAgent), kKindText, kNone});
-  t.push_back({"UseDates", check(p.ChkDates), kKindCheck, kZero});
-  t.push_back({"FromDate", text(p.TxtFromDate), kKindText, kFirstDate});
-  t.push_back({"ToDate", text(p.TxtToDate), kKindText, kLastDate});
-  t.push_back({"DocType", list(p.cmbDocType, kDocTypeListSize), kKindList, kZero});
-  t.push_back({"ByDoc", list(p.cmbByDoc, kByDocListSize), kKindList, kZero});
-  t.push_back({"UseJournal", check(p.ChkJournal), kKindCheck, kZero});
-  t.push_back({"FromJournal", text(p.txtFromJournal), kKindText, kNone});
-  t.push_back({"ToJournal", text(p.txtToJournal), kKindText, kNone});
-  t.push_back({"UseTransType", check(p.chkTransType), kKindCheck, kZero});
-  t.push_back({"TransType", text(p.txtTransType), kKindText, kNone});
-  t.push_back({"UseTransDates", check(p.chkTransDates), kKindCheck, kZero});
-  t.push_back({"FromTransDate", text(p.txtFromTransDate), kKindText, kFirstDate});
+  std::vector<SettingDef> t;
+  const auto text = [&t](std::string name, std::string_view def, auto at, int i = 0) {
+    t.push_back({std::move(name), kParams, kText, 0, def, at, i});
+  };
+  const auto check = [&t](std::string name, auto at, int i = 0) {
+    t.push_back({std::move(name), kParams, kCheck, 0, "0", at, i});
+  };
+  const auto list = [&t](std::string name, int size, auto at) {
+    t.push_back({std::move(name), kParams, kList, size, "0", at, 0});
+  };
+
+  // Section Params, in the order SetGetRegParams moves it.
+  check("UseCatCode", ZDR_AT(t.panel.ChkCatCode));
+  text("FromSort", kNone, ZDR_AT(t.panel.txtFromSort));
+  text("ToSort", kNone, ZDR_AT(t.panel.txtToSort));
+  check("UseAccKey", ZDR_AT(t.panel.ChkAccKey));
+  for (int i = 1; i <= 4; ++i)
+    text("CutOff" + std::to_string(i), "*", ZDR_AT(t.panel.CutOff[i]), i);
+  check("UseCutOff", ZDR_AT(t.panel.chkCutOff));
+  text("FromCrd", kNone, ZDR_AT(t.panel.TxtFromCrd));
+  text("ToCrd", kNone, ZDR_AT(t.panel.TxtToCrd));
+  check("UseCity", ZDR_AT(t.panel.ChkCity));
+  text("City", kNone, ZDR_AT(t.panel.TxtCity));
+  check("UsePhone", ZDR_AT(t.panel.ChkPhone));
+  text("Phone", kNone, ZDR_AT(t.panel.txtPhone));
+  check("UseAgent", ZDR_AT(t.panel.ChkAgent));
+  text("FromAgent", kNone, ZDR_AT(t.panel.txtAgent));
+  text("ToAgent", kNone, ZDR_AT(t.panel.txtToAgent));
+  check("UseDates", ZDR_AT(t.panel.ChkDates));
+  text("FromDate", kFirstDate, ZDR_AT(t.panel.TxtFromDate));
+  text("ToDate", kLastDate, ZDR_AT(t.panel.TxtToDate));
+  list("DocType", kDocTypeListSize, ZDR_AT(t.panel.cmbDocType));
+  list("ByDoc", kByDocListSize, ZDR_AT(t.panel.cmbByDoc));
+  check("UseJournal", ZDR_AT(t.panel.ChkJournal));
+  text("FromJournal", kNone, ZDR_AT(t.panel.txtFromJournal));
+  text("ToJournal", kNone, ZDR_AT(t.panel.txtToJournal));
+  check("UseTransType", ZDR_AT(t.panel.chkTransType));
+  text("TransType", kNone, ZDR_AT(t.panel.txtTransType));
+  check("UseTransDates", ZDR_AT(t.panel.chkTransDates));
+  text("FromTransDate", kFirstDate, ZDR_AT(t.panel.txtFromTransDate));
   // The ledger "to" dates are stored under FromToDate and FromToVDate.
-  t.push_back({"FromToDate", text(p.txtToTransDate), kKindText, kLastDate});
-  t.push_back({"UseTransVDate", check(p.chkTransVDate), kKindCheck, kZero});
-  t.push_back({"FromTransVDate", text(p.txtFromTransVDate), kKindText, kFirstDate});
-  t.push_back({"FromToVDate", text(p.txtToTransVDate), kKindText, kLastDate});
-  t.push_back({"Rows", text(p.txtRows), kKindText, "8"});
-  t.push_back({"Cols", text(p.txtCols), kKindText, "3"});
-  t.push_back({"Copies", text(p.txtCopies), kKindText, "1"});
-  t.push_back({"SortBy", list(p.CmbSortBy, kSortByListSize), kKindList, kZero});
-  t.push_back({"SortDir", list(p.CmbSortDir, kSortDirListSize), kKindList, kZero});
-  t.push_back({"ReadTempTrans", check(p.chkReadTempTrans), kKindCheck, kZero});
-  t.push_back({"InAccounts", list(p.cmbInAccounts, kInAccountsListSize), kKindList, kZero});
-  t.push_back({"AddressFrom", list(p.cmbAddressFrom, kAddressFromListSize), kKindList, kZero});
-  for (int i = 0; i <= 8; ++i) {
-    t.push_back({"UseTitle" + std::to_string(i), check(p.ChkTitle[i]), kKindCheck, kZero});
-  }
-  for (int i = 0; i <= 1; ++i) {
-    t.push_back({"UseLogo" + std::to_string(i), check(p.ChkLogo[i]), kKindCheck, kZero});
-  }
+  text("FromToDate", kLastDate, ZDR_AT(t.panel.txtToTransDate));
+  check("UseTransVDate", ZDR_AT(t.panel.chkTransVDate));
+  text("FromTransVDate", kFirstDate, ZDR_AT(t.panel.txtFromTransVDate));
+  text("FromToVDate", kLastDate, ZDR_AT(t.panel.txtToTransVDate));
+  text("Rows", "8", ZDR_AT(t.panel.txtRows));
+  text("Cols", "3", ZDR_AT(t.panel.txtCols));
+  text("Copies", "1", ZDR_AT(t.panel.txtCopies));
+  list("SortBy", kSortByListSize, ZDR_AT(t.panel.CmbSortBy));
+  list("SortDir", kSortDirListSize, ZDR_AT(t.panel.CmbSortDir));
+  check("ReadTempTrans", ZDR_AT(t.panel.chkReadTempTrans));
+  list("InAccounts", kInAccountsListSize, ZDR_AT(t.panel.cmbInAccounts));
+  list("AddressFrom", kAddressFromListSize, ZDR_AT(t.panel.cmbAddressFrom));
+  for (int i = 0; i <= 8; ++i)
+    check("UseTitle" + std::to_string(i), ZDR_AT(t.panel.ChkTitle[i]), i);
+  for (int i = 0; i <= 1; ++i) check("UseLogo" + std::to_string(i), ZDR_AT(t.panel.ChkLogo[i]), i);
+
+  // Section PostIL, in the order SetGetRegPostILDefs moves it.
+  constexpr auto kPost = Stored::kByPostIL;
+  t.push_back({"Service", kPost, kText, 0, kNone, ZDR_AT(t.postIL.Service), 0});
+  t.push_back({"Weight", kPost, ValueRule::kWeight, 0, kNone, ZDR_AT(t.postIL.Weight), 0});
+  t.push_back({"Confirm", kPost, kText, 0, kNone, ZDR_AT(t.postIL.Confirm), 0});
+  t.push_back({"FilePath", kPost, kText, 0, kNone, ZDR_AT(t.postIL.FilePath), 0});
+  t.push_back({"OpenExcel", kPost, kCheck, 0, kZero, ZDR_AT(t.postIL.OpenExcel), 0});
+  t.push_back({"FileFormat", kPost, kList, static_cast<int>(kFileFormatEntries.size()), kZero,
+               ZDR_AT(t.postIL.FileFormat), 0});
+
+  t.push_back({std::string(kConnDataBaseKey), Stored::kConnection, kText, 0, kNone,
+               ZDR_AT(t.companyPath), 0});
+
+  // Panel controls the store does not keep.
+  constexpr auto kNot = Stored::kNot;
+  t.push_back({"txtFromRef", kNot, kText, 0, kNone, ZDR_AT(t.panel.txtFromRef), 0});
+  t.push_back({"txtToRef", kNot, kText, 0, kNone, ZDR_AT(t.panel.txtToRef), 0});
+  t.push_back({"ChkByItems", kNot, kCheck, 0, kZero, ZDR_AT(t.panel.ChkByItems), 0});
+  t.push_back({"txtFromItmKey", kNot, kText, 0, kNone, ZDR_AT(t.panel.txtFromItmKey), 0});
+  t.push_back({"txtToItmKey", kNot, kText, 0, kNone, ZDR_AT(t.panel.txtToItmKey), 0});
+  t.push_back({"txtFromItmSort", kNot, kText, 0, kNone, ZDR_AT(t.panel.txtFromItmSort), 0});
+  t.push_back({"txtToItmSort", kNot, kText, 0, kNone, ZDR_AT(t.panel.txtToItmSort), 0});
+  t.push_back({"txtStartFrom", kNot, kText, 0, "1", ZDR_AT(t.panel.txtStartFrom), 0});
   return t;
+}
+
+#undef ZDR_AT
+
+// The number `text` stands for under a number rule, or nothing when the rule refuses it.
+std::optional<long> RuleNumber(ValueRule rule, int listSize, std::string_view text) {
+  return rule == ValueRule::kList ? ParseInRange(text, -1, listSize - 1) : ParseInRange(text, 0, 2);
 }
 
 std::string LabelDefSection(int line) {
@@ -129,14 +164,6 @@ void LoadByte(SettingsStore& store, std::string_view section, std::string_view k
   });
 }
 
-void LoadInt16(SettingsStore& store, std::string_view section, std::string_view key,
-               int16_t& field) {
-  IgnoringErrors([&] {
-    const auto value = ParseInRange(store.Get(kSettingsApp, section, key, "0"), -32768, 32767);
-    if (value) field = static_cast<int16_t>(*value);
-  });
-}
-
 void LoadText(SettingsStore& store, std::string_view section, std::string_view key,
               std::string& field) {
   IgnoringErrors([&] { field = store.Get(kSettingsApp, section, key, ""); });
@@ -149,8 +176,13 @@ void SaveValue(SettingsStore& store, std::string_view section, std::string_view 
 
 }  // namespace
 
-SettingsValueError::SettingsValueError(std::string key, std::string value)
-    : std::runtime_error("הערך השמור \"" + value + "\" של ההגדרה " + key + " אינו תקין"),
+SettingsValueError::SettingsValueError(std::string section, std::string key, std::string value)
+    : std::runtime_error("הערך \"" + value + "\" של ההגדרה " + key + " אינו תקין" +
+                         [&key] {
+                           const SettingDef* def = FindSetting(key);
+                           return def == nullptr ? std::string() : " (" + AllowedValues(*def) + ")";
+                         }()),
+      section_(std::move(section)),
       key_(std::move(key)),
       value_(std::move(value)) {}
 
@@ -205,23 +237,95 @@ void SetGetRegValue(uint8_t action, SettingsStore& store, std::string_view app,
     return;
   }
   // A combo box takes -1 (no entry) or an index of its list; a check box 0, 1 or 2.
-  const auto number = kind == kKindList ? ParseInRange(stored, -1, value.listSize() - 1)
-                                        : ParseInRange(stored, 0, 2);
-  if (!number) throw SettingsValueError(std::string(key), std::move(stored));
+  const auto number = kind == kKindList ? RuleNumber(ValueRule::kList, value.listSize(), stored)
+                                        : RuleNumber(ValueRule::kCheck, 0, stored);
+  if (!number) throw SettingsValueError(std::string(section), std::string(key), std::move(stored));
   *value.number() = static_cast<int>(*number);
 }
 
+const std::vector<SettingDef>& SettingsTable() {
+  static const std::vector<SettingDef> table = BuildSettingsTable();
+  return table;
+}
+
+const SettingDef* FindSetting(std::string_view name) {
+  for (const SettingDef& def : SettingsTable()) {
+    if (def.name == name) return &def;
+  }
+  return nullptr;
+}
+
+std::string_view SectionOf(const SettingDef& def) {
+  switch (def.stored) {
+    case Stored::kByParams:
+    case Stored::kConnection:
+      return kParamsSection;
+    case Stored::kByPostIL:
+      return kPostILSection;
+    case Stored::kNot:
+      break;
+  }
+  return "";
+}
+
+std::string AllowedValues(const SettingDef& def) {
+  switch (def.rule) {
+    case ValueRule::kText:
+      return "כל טקסט";
+    case ValueRule::kCheck:
+      return "0, 1 או 2";
+    case ValueRule::kList:
+      return "0 עד " + std::to_string(def.listSize - 1) + ", או -1 ללא בחירה";
+    case ValueRule::kWeight:
+      return "ריק, או מספר חיובי עם נקודה עשרונית, למשל 0.5";
+  }
+  return "";
+}
+
+void ApplySetting(const SettingDef& def, std::string_view text, SettingTargets targets) {
+  const Ref at = def.at(targets, def.index);
+  const auto refuse = [&] {
+    return SettingsValueError(std::string(SectionOf(def)), def.name, std::string(text));
+  };
+  if (def.rule == ValueRule::kText || def.rule == ValueRule::kWeight) {
+    if (def.rule == ValueRule::kWeight && !IsDispatchWeight(text)) throw refuse();
+    *std::get<std::string*>(at) = std::string(text);
+    return;
+  }
+  const std::optional<long> number = RuleNumber(def.rule, def.listSize, text);
+  if (!number) throw refuse();
+  if (int* const* i = std::get_if<int*>(&at)) {
+    **i = static_cast<int>(*number);
+  } else {
+    *std::get<int16_t*>(at) = static_cast<int16_t>(*number);
+  }
+}
+
 std::vector<std::string> ParamsKeys() {
-  Panel scratch;
   std::vector<std::string> keys;
-  for (auto& entry : ParamsTable(scratch)) keys.push_back(std::move(entry.key));
+  for (const SettingDef& def : SettingsTable()) {
+    if (def.stored == Stored::kByParams) keys.push_back(def.name);
+  }
   return keys;
 }
 
 void SetGetRegParams(uint8_t action, SettingsStore& store, Panel& panel) {
-  for (const auto& entry : ParamsTable(panel)) {
-    SetGetRegValue(action, store, kSettingsApp, kParamsSection, entry.key, entry.value, entry.kind,
-                   entry.defaultValue);
+  PostILSettings unused;
+  std::string noPath;
+  SettingTargets targets{panel, unused, noPath};
+  for (const SettingDef& def : SettingsTable()) {
+    if (def.stored != Stored::kByParams) continue;
+    const Ref at = def.at(targets, def.index);
+    const ControlValueRef value =
+        def.rule == ValueRule::kText ? ControlValueRef::Text(*std::get<std::string*>(at))
+        : def.rule == ValueRule::kList
+            ? ControlValueRef::ListIndex(*std::get<int*>(at), def.listSize)
+            : ControlValueRef::CheckValue(*std::get<int*>(at));
+    const uint8_t kind = def.rule == ValueRule::kText   ? kKindText
+                         : def.rule == ValueRule::kList ? kKindList
+                                                        : kKindCheck;
+    SetGetRegValue(action, store, kSettingsApp, kParamsSection, def.name, value, kind,
+                   def.defaultValue);
   }
 }
 
@@ -270,22 +374,52 @@ void SetGetRegLabelDefs(uint8_t action, SettingsStore& store, LabelSettings& lab
   }
 }
 
-void SetGetRegPostILDefs(uint8_t action, SettingsStore& store, PostILSettings& postIL) {
-  if (action == kActionSave) {
-    SaveValue(store, kPostILSection, "Service", postIL.Service);
-    SaveValue(store, kPostILSection, "Weight", postIL.Weight);
-    SaveValue(store, kPostILSection, "Confirm", postIL.Confirm);
-    SaveValue(store, kPostILSection, "FilePath", postIL.FilePath);
-    SaveValue(store, kPostILSection, "OpenExcel", std::to_string(postIL.OpenExcel));
-    SaveValue(store, kPostILSection, "FileFormat", std::to_string(postIL.FileFormat));
-  } else if (action == kActionLoad) {
-    LoadText(store, kPostILSection, "Service", postIL.Service);
-    LoadText(store, kPostILSection, "Weight", postIL.Weight);
-    LoadText(store, kPostILSection, "Confirm", postIL.Confirm);
-    LoadText(store, kPostILSection, "FilePath", postIL.FilePath);
-    LoadInt16(store, kPostILSection, "OpenExcel", postIL.OpenExcel);
-    LoadInt16(store, kPostILSection, "FileFormat", postIL.FileFormat);
+std::vector<SettingsValueError> SetGetRegPostILDefs(uint8_t action, SettingsStore& store,
+                                                    PostILSettings& postIL) {
+  std::vector<SettingsValueError> refused;
+  if (action != kActionSave && action != kActionLoad) return refused;
+  Panel unused;
+  std::string noPath;
+  SettingTargets targets{unused, postIL, noPath};
+  for (const SettingDef& def : SettingsTable()) {
+    if (def.stored != Stored::kByPostIL) continue;
+    if (action == kActionSave) {
+      const Ref at = def.at(targets, def.index);
+      const std::string text = std::holds_alternative<std::string*>(at)
+                                   ? *std::get<std::string*>(at)
+                                   : std::to_string(*std::get<int16_t*>(at));
+      SaveValue(store, kPostILSection, def.name, text);
+      continue;
+    }
+    // Statement by statement: a value that cannot be read or is refused leaves the old one.
+    try {
+      ApplySetting(def, store.Get(kSettingsApp, kPostILSection, def.name, def.defaultValue),
+                   targets);
+    } catch (const SettingsValueError& e) {
+      refused.push_back(e);
+    } catch (const std::exception&) {
+    }
   }
+  return refused;
+}
+
+std::string RefusedSettingsMessage(const std::vector<SettingsValueError>& refused,
+                                   std::string_view where) {
+  std::string text;
+  for (const SettingsValueError& e : refused) {
+    if (!text.empty()) text += "\n";
+    text += where.empty() ? std::string("בהגדרות השמורות: ")
+                          : "בקובץ ההגדרות " + std::string(where) + ": ";
+    text += e.what();
+    text += ". ";
+    const SettingDef* def = FindSetting(e.key());
+    if (def != nullptr && def->stored == Stored::kByParams) {
+      text += "ההגדרה הזאת וההגדרות שאחריה בחלון הראשי לא נטענו, ומוצגים בהן ערכי ברירת המחדל";
+    } else {
+      text += "ההגדרה הזאת לא נטענה";
+    }
+  }
+  return text;
 }
 
 namespace {
@@ -315,7 +449,9 @@ void SaveUserStockIds(SettingsStore& store, const std::vector<std::string>& ids)
   store.Save(kSettingsApp, kLabelStocksSection, "Ids", list);
 }
 
-std::optional<LabelStock> LoadUserStock(SettingsStore& store, const std::string& id) {
+// The user's stock `id` from the store, or nothing with the reason in `why` (Hebrew).
+std::optional<LabelStock> LoadUserStock(SettingsStore& store, const std::string& id,
+                                        std::string& why) {
   const std::string section = StockSection(id);
   LabelStock s;
   s.id = id;
@@ -324,18 +460,29 @@ std::optional<LabelStock> LoadUserStock(SettingsStore& store, const std::string&
       {"PageWidth", &s.pageWidth}, {"PageHeight", &s.pageHeight}, {"Top", &s.top},
       {"Side", &s.side},           {"LabelWidth", &s.labelWidth}, {"LabelHeight", &s.labelHeight},
       {"PitchX", &s.pitchX},       {"PitchY", &s.pitchY},         {"Padding", &s.padding}};
+  const auto missing = [&](const char* key) {
+    why = "הערך " + std::string(key) + " של התבנית חסר או אינו מספר";
+    return std::nullopt;
+  };
   for (const auto& [key, field] : sizes) {
     const auto v = ParseMm(store.Get(kSettingsApp, section, key, ""));
-    if (!v) return std::nullopt;
+    if (!v) return missing(key);
     *field = *v;
   }
   const auto rows = ParseInRange(store.Get(kSettingsApp, section, "Rows", ""), 1, 100);
+  if (!rows) return missing("Rows");
   const auto cols = ParseInRange(store.Get(kSettingsApp, section, "Cols", ""), 1, 100);
-  if (!rows || !cols) return std::nullopt;
+  if (!cols) return missing("Cols");
   s.rows = static_cast<int>(*rows);
   s.cols = static_cast<int>(*cols);
-  if (!UserStockIdProblem(s.id).empty() || !LabelStockProblem(s).empty() || FindShippedStock(s.id))
+  why = UserStockIdProblem(s.id);
+  if (!why.empty()) return std::nullopt;
+  if (FindShippedStock(s.id)) {
+    why = "השם " + s.id + " שמור לתבנית מובנית";
     return std::nullopt;
+  }
+  why = LabelStockProblem(s);
+  if (!why.empty()) return std::nullopt;
   return s;
 }
 
@@ -389,10 +536,41 @@ void SetGetRegLabelPdf(uint8_t action, SettingsStore& store, LabelPdfSettings& p
 
 std::vector<LabelStock> LoadUserStocks(SettingsStore& store) {
   std::vector<LabelStock> stocks;
+  std::string why;
   for (const std::string& id : UserStockIds(store)) {
-    if (auto s = LoadUserStock(store, id)) stocks.push_back(std::move(*s));
+    if (auto s = LoadUserStock(store, id, why)) stocks.push_back(std::move(*s));
   }
   return stocks;
+}
+
+std::vector<std::pair<std::string, std::string>> UnusableUserStocks(SettingsStore& store) {
+  std::vector<std::pair<std::string, std::string>> unusable;
+  std::string why;
+  for (const std::string& id : UserStockIds(store)) {
+    if (!LoadUserStock(store, id, why)) unusable.emplace_back(id, why);
+  }
+  return unusable;
+}
+
+std::string LabelStockChoiceProblem(SettingsStore& store, std::string_view id) {
+  if (FindShippedStock(id)) return "";
+  std::string why;
+  for (const std::string& user : UserStockIds(store)) {
+    if (user != id) continue;
+    if (LoadUserStock(store, user, why)) return "";
+    return "תבנית המדבקות \"" + user + "\" שבהגדרות אינה תקינה: " + why;
+  }
+  if (const CatalogueEntry* e = InstalledStockCatalogue().Find(id)) {
+    if (e->stock) return "";
+    return "את תבנית המדבקות \"" + std::string(id) + "\" לא ניתן להדפיס: " + e->problem;
+  }
+  std::string known;
+  for (const LabelStock& s : AvailableLabelStocks(store))
+    known += (known.empty() ? "" : ", ") + s.id;
+  // The catalogue's are too many to list.
+  if (!InstalledStockCatalogue().entries.empty())
+    known += ", ותבניות הקטלוג לפי יצרן ומק\"ט (כמו \"Avery L7160\")";
+  return "תבנית המדבקות \"" + std::string(id) + "\" אינה מוכרת. התבניות המוכרות: " + known;
 }
 
 void SaveUserStock(SettingsStore& store, const LabelStock& stock) {
@@ -438,26 +616,12 @@ std::vector<LabelStock> AvailableLabelStocks(SettingsStore& store) {
 
 std::optional<LabelStock> FindLabelStock(SettingsStore& store, std::string_view id) {
   if (auto shipped = FindShippedStock(id)) return shipped;
+  std::string why;
   for (const std::string& user : UserStockIds(store)) {
-    if (user == id) return LoadUserStock(store, user);
+    if (user == id) return LoadUserStock(store, user, why);
   }
   if (const CatalogueEntry* e = InstalledStockCatalogue().Find(id)) return e->stock;
   return std::nullopt;
-}
-
-std::string LabelStockLookupProblem(SettingsStore& store, std::string_view id) {
-  if (FindLabelStock(store, id)) return "";
-  if (const CatalogueEntry* e = InstalledStockCatalogue().Find(id)) {
-    return "את תבנית המדבקות \"" + std::string(id) + "\" לא ניתן להדפיס: " + e->problem;
-  }
-  for (const std::string& user : UserStockIds(store)) {
-    if (user != id) continue;
-    // A stock of the user's own whose stored figures are spoilt: say which check fails.
-    std::string problem = UserStockIdProblem(id);
-    if (problem.empty()) problem = "הערכים השמורים שלה חסרים או אינם תקינים";
-    return "את תבנית המדבקות \"" + std::string(id) + "\" לא ניתן להדפיס: " + problem;
-  }
-  return "תבנית המדבקות \"" + std::string(id) + "\" אינה מוכרת";
 }
 
 std::optional<StockOffset> LoadStockOffset(SettingsStore& store, std::string_view id) {

@@ -12,6 +12,7 @@
 #include <string>
 #include <string_view>
 #include <tuple>
+#include <variant>
 #include <vector>
 
 #include "common/panel.h"
@@ -57,6 +58,9 @@ class SettingsStore {
   // SettingsStoreError when the store cannot be written.
   virtual void Save(std::string_view app, std::string_view section, std::string_view key,
                     std::string_view value) = 0;
+
+  // Where the values live, for messages (a file's path); "" when nowhere a person could open.
+  virtual std::string Location() const { return ""; }
 };
 
 // The store could not be written (for example a read-only settings file).
@@ -65,16 +69,19 @@ class SettingsStoreError : public std::runtime_error {
   using std::runtime_error::runtime_error;
 };
 
-// A stored value that its control refuses: a list index outside the list, a non-number
-// for a list index or a check value, a check value other than 0, 1 or 2. what() is a
-// Hebrew message naming the key and the value.
+// A value that its control refuses: a list index outside the list, a non-number for a list
+// index or a check value, a check value other than 0, 1 or 2, a weight that is not a
+// positive number. what() is a Hebrew message naming the key, the value and what the key
+// takes.
 class SettingsValueError : public std::runtime_error {
  public:
-  SettingsValueError(std::string key, std::string value);
+  SettingsValueError(std::string section, std::string key, std::string value);
+  const std::string& section() const { return section_; }
   const std::string& key() const { return key_; }
   const std::string& value() const { return value_; }
 
  private:
+  std::string section_;
   std::string key_;
   std::string value_;
 };
@@ -139,6 +146,63 @@ void SetGetRegValue(uint8_t action, SettingsStore& store, std::string_view app,
                     std::string_view section, std::string_view key, ControlValueRef value,
                     uint8_t kind, std::string_view defaultValue);
 
+// ---- One table of the values the settings, the command line and the dialogs take --------
+
+// What a value must be for its control to take it.
+enum class ValueRule {
+  kText,    // any text
+  kCheck,   // a check box's value: 0, 1 or 2 (greyed)
+  kList,    // a combo box's index: -1 (no entry) up to the list's last entry
+  kWeight,  // empty, or a positive number with a decimal point ("0.5", "2")
+};
+
+// How a value reaches the settings store.
+enum class Stored {
+  kByParams,    // section Params, moved with the whole panel by SetGetRegParams
+  kByPostIL,    // section PostIL, moved by SetGetRegPostILDefs
+  kConnection,  // Params/ConnDataBase, moved by SetGetRegConnParams
+  kNot,         // a panel control the store does not keep
+};
+
+// Where the values live: the panel, the dispatch settings and the company path.
+struct SettingTargets {
+  Panel& panel;
+  PostILSettings& postIL;
+  std::string& companyPath;
+};
+
+// One value: its name (the store's key, or the control's name when not stored), how it is
+// stored, the rule its values meet, its list's size (kList), the default a load takes when
+// the store has none, and where it lives.
+struct SettingDef {
+  std::string name;
+  Stored stored;
+  ValueRule rule;
+  int listSize;
+  std::string_view defaultValue;
+  // The value in `t`: a text, a panel number, or a 16-bit number of the dispatch settings.
+  std::variant<std::string*, int*, int16_t*> (*at)(SettingTargets& t, int index);
+  int index;  // of a control array (CutOff, ChkTitle, ChkLogo); 0 otherwise
+};
+
+// Every value, the keys of section Params in the order SetGetRegParams moves them, then the
+// dispatch settings in their order, the company path and the unstored panel controls.
+const std::vector<SettingDef>& SettingsTable();
+
+// The value named `name` (exact case), or nullptr.
+const SettingDef* FindSetting(std::string_view name);
+
+// The store's section of a stored value ("" for Stored::kNot).
+std::string_view SectionOf(const SettingDef& def);
+
+// What `def` takes, in Hebrew, for a message ("0, 1 או 2").
+std::string AllowedValues(const SettingDef& def);
+
+// Gives `def` the value `text` in `targets`, as its control would take it (a number from
+// its text, blanks around it allowed). Throws SettingsValueError and leaves the value as it
+// was when the rule refuses `text`.
+void ApplySetting(const SettingDef& def, std::string_view text, SettingTargets targets);
+
 // The keys of section Params, in the order SetGetRegParams moves them.
 std::vector<std::string> ParamsKeys();
 
@@ -163,9 +227,17 @@ void SetGetRegLabelDefs(uint8_t action, SettingsStore& store, LabelSettings& lab
 
 // Saves or loads the dispatch settings in section PostIL, keys Service, Weight, Confirm,
 // FilePath, OpenExcel, FileFormat in that order (texts default empty, integers 0). Errors
-// are ignored value by value: a stored integer that is not a 16-bit whole number leaves
-// the old one.
-void SetGetRegPostILDefs(uint8_t action, SettingsStore& store, PostILSettings& postIL);
+// are ignored value by value: a stored value its rule refuses (a weight that is not a
+// positive number, OpenExcel other than 0, 1 or 2, FileFormat other than -1, 0 or 1)
+// leaves the old one, and the load returns such values in order. A save returns nothing.
+std::vector<SettingsValueError> SetGetRegPostILDefs(uint8_t action, SettingsStore& store,
+                                                    PostILSettings& postIL);
+
+// A Hebrew message for the clerk about the stored values a load refused (`refused`, from
+// SetGetRegParams and SetGetRegPostILDefs) in the store at `where`: which key and value,
+// and what was therefore not loaded.
+std::string RefusedSettingsMessage(const std::vector<SettingsValueError>& refused,
+                                   std::string_view where);
 
 // Saves or loads how the label command prints: section LabelPdf, keys Template (default
 // a4-3x8-70x37), OffsetX and OffsetY (millimetres, default 0), ScaleX and ScaleY (per
@@ -181,6 +253,16 @@ void SetGetRegLabelPdf(uint8_t action, SettingsStore& store, LabelPdfSettings& p
 // shipped stock's id.
 std::vector<LabelStock> LoadUserStocks(SettingsStore& store);
 
+// The user's listed stocks that LoadUserStocks leaves out, each with the reason (Hebrew):
+// a value missing or not a number (naming its key), LabelStockProblem's reason, or a shipped
+// stock's id.
+std::vector<std::pair<std::string, std::string>> UnusableUserStocks(SettingsStore& store);
+
+// Why labels cannot be printed on the stock named `id` (Hebrew): a user stock that fails its
+// check, with the reason, a catalogue template this system cannot print, with the reason, or
+// an id no stock has, with the ids there are. "" when FindLabelStock finds it.
+std::string LabelStockChoiceProblem(SettingsStore& store, std::string_view id);
+
 // Adds or replaces a user stock. Throws std::invalid_argument (Hebrew) for a stock that
 // UserStockIdProblem or LabelStockProblem refuses or that takes a shipped stock's id;
 // SettingsStoreError when the store cannot be written.
@@ -195,11 +277,6 @@ std::vector<LabelStock> AvailableLabelStocks(SettingsStore& store);
 // The stock named `id` among AvailableLabelStocks, a retired shipped stock, or a stock of
 // the installed catalogue that can be printed ("Avery L7160"); nothing otherwise.
 std::optional<LabelStock> FindLabelStock(SettingsStore& store, std::string_view id);
-
-// Why FindLabelStock finds nothing for `id` (a Hebrew sentence naming it): unknown, the
-// catalogue's reason it cannot be printed, or a spoilt stock of the user's. Empty when it
-// finds one.
-std::string LabelStockLookupProblem(SettingsStore& store, std::string_view id);
 
 // A stock's own correction (keys OffsetX, OffsetY, ScaleX and ScaleY of section
 // "LabelStock." + id), when both offsets are kept and valid; a scale missing or not valid

@@ -22,7 +22,7 @@ StockChoice ChooseStock(SettingsStore& store, const LabelPdfSettings& pdf,
                         UserSeam& ui) {
   const std::string id = stockId.empty() ? pdf.Template : stockId;
   std::optional<LabelStock> stock = FindLabelStock(store, id);
-  if (!stock) throw std::runtime_error(LabelStockLookupProblem(store, id));
+  if (!stock) throw std::runtime_error(LabelStockChoiceProblem(store, id));
   if (IsRetiredStock(stock->id)) {
     ui.SetStatus("תבנית המדבקות " + stock->id +
                  " אינה לפי גיליון מפורסם ואינה מוצעת עוד; היא מודפסת כבעבר. מומלץ לבחור "
@@ -40,11 +40,13 @@ void OpenPdf(UserSeam& ui, const std::string& path) {
 
 std::string Control::CmdLabPdf(const std::string& path, const std::string& stockId,
                                std::optional<StockOffset> offset) {
+  lastLoad_ = {true, 0};
+  if (TargetRefused(path, TargetKind::kPdf)) return "";
   try {
     const StockChoice choice = ChooseStock(store_, labelPdf_, stockId, offset, ui_);
     // The data load rebuilds the temporary folder's working database: no other run may.
     const auto lock = LockWorkFiles();
-    ReadAllData(true);
+    if (!ReadAllData(true).databaseUsable) return "";
     ui_.YieldToEvents();
     ui_.SetStatus("מכין רשימה");
     CreateLabPdf(path, state_.workDbPath, panel_, docTypes_, state_.selectDbPath, labels_,
@@ -60,6 +62,8 @@ std::string Control::CmdLabPdf(const std::string& path, const std::string& stock
 
 std::string Control::CmdCalibrate(const std::string& path, const std::string& stockId,
                                   std::optional<StockOffset> offset) {
+  lastLoad_ = {true, 0};
+  if (TargetRefused(path, TargetKind::kPdf)) return "";
   try {
     const StockChoice choice = ChooseStock(store_, labelPdf_, stockId, offset, ui_);
     CreateCalibrationPdf(path, choice.stock, choice.offset);

@@ -10,6 +10,7 @@
 #include <system_error>
 #include <utility>
 
+#include "common/diskfull.h"
 #include "engine/collation.h"
 #include "engine/engineinternal.h"
 #include "engine/jetsql.h"
@@ -143,6 +144,11 @@ EngineError StepFailure(sqlite3* db, int rc, std::string_view sql) {
   if ((rc & 0xFF) == SQLITE_CANTOPEN || (rc & 0xFF) == SQLITE_NOTADB) {
     return EngineError(kErrCannotOpen, "לא ניתן לקרוא את מסד הנתונים: " + message);
   }
+  if ((rc & 0xFF) == SQLITE_FULL || (extended & 0xFF) == SQLITE_FULL) {
+    const char* file = db != nullptr ? sqlite3_db_filename(db, "main") : nullptr;
+    return EngineError(kErrDiskFull,
+                       DiskFullMessage(file != nullptr && *file != '\0' ? file : "zdrlab.DB"));
+  }
   std::string description = "תקלה במנוע מסד הנתונים: " + message;
   if (!sql.empty()) description += "\nבמשפט: " + std::string(sql);
   return EngineError(kErrEngine, description);
@@ -172,12 +178,19 @@ void Connection::RecordsetOpened() {
   ++openRecordsets;
 }
 
-std::string Connection::RecordsetClosed() {
+std::optional<EngineError> Connection::RecordsetClosed() {
   if (openRecordsets > 0) --openRecordsets;
   if (openRecordsets == 0 && ownsTransaction) {
     ownsTransaction = false;
-    if (sqlite3_exec(db, "COMMIT", nullptr, nullptr, nullptr) != SQLITE_OK) {
-      std::string failure = SqliteMessage(db);
+    const int rc = sqlite3_exec(db, "COMMIT", nullptr, nullptr, nullptr);
+    if (rc != SQLITE_OK) {
+      const int code = sqlite3_extended_errcode(db);
+      std::optional<EngineError> failure;
+      if ((rc & 0xFF) == SQLITE_FULL || (code & 0xFF) == SQLITE_FULL) {
+        failure = StepFailure(db, SQLITE_FULL, "");
+      } else {
+        failure = EngineError(kErrEngine, "לא ניתן לשמור את הרשומות בקובץ: " + SqliteMessage(db));
+      }
       // A failed COMMIT may leave the transaction open; end it so the connection does not
       // keep holding the file's lock.
       if (sqlite3_get_autocommit(db) == 0) {
@@ -186,7 +199,7 @@ std::string Connection::RecordsetClosed() {
       return failure;
     }
   }
-  return std::string();
+  return std::nullopt;
 }
 
 // ---------------------------------------------------------------------------------------

@@ -39,6 +39,7 @@ inline constexpr int kErrNotEditing = 3020;       // field set or Update without
 inline constexpr int kErrNullKey = 3058;          // Null in a field of the primary index
 inline constexpr int kErrTypeConversion = 3421;   // value cannot become the field's type
 inline constexpr int kErrForwardOnly = 3219;      // move back in a forward-only snapshot
+inline constexpr int kErrDiskFull = 3026;         // no room left on the disk
 
 class EngineError : public std::runtime_error {
  public:

@@ -7,6 +7,7 @@
 #include <cstdint>
 #include <filesystem>
 #include <memory>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <utility>
@@ -84,9 +85,9 @@ struct Connection {
 
   // Called when a recordset opens: the first one begins the shared transaction.
   void RecordsetOpened();
-  // Called when a recordset closes: the last one commits. Returns the failure's
-  // description, empty when the rows are in the file.
-  std::string RecordsetClosed();
+  // Called when a recordset closes: the last one commits. Returns the failure (kErrDiskFull
+  // for a full disk), nothing when the rows are in the file.
+  std::optional<EngineError> RecordsetClosed();
 };
 
 struct LinkState {

@@ -168,14 +168,14 @@ struct TableRecordset::Impl {
   Impl& operator=(const Impl&) = delete;
   ~Impl() { CloseQuietly(); }
 
-  // Returns the commit's failure, empty when the rows are in the file.
-  std::string CloseQuietly() {
-    if (!conn) return std::string();
+  // Returns the commit's failure, nothing when the rows are in the file.
+  std::optional<EngineError> CloseQuietly() {
+    if (!conn) return std::nullopt;
     sqlite3_finalize(insert);
     insert = nullptr;
     for (KeptField& k : kept) sqlite3_finalize(k.insert);
     kept.clear();
-    std::string failure = conn->RecordsetClosed();
+    std::optional<EngineError> failure = conn->RecordsetClosed();
     conn.reset();
     return failure;
   }
@@ -545,10 +545,7 @@ void TableRecordset::Update() {
 
 void TableRecordset::Close() {
   if (!impl_) return;
-  const std::string failure = impl_->CloseQuietly();
-  if (!failure.empty()) {
-    throw EngineError(kErrEngine, "לא ניתן לשמור את הרשומות בקובץ: " + failure);
-  }
+  if (std::optional<EngineError> failure = impl_->CloseQuietly()) throw *failure;
 }
 
 }  // namespace zdr::db

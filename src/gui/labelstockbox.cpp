@@ -198,6 +198,19 @@ void LabelStockBox::Load() {
   FillStocks(pdf.Template);
   ShowOffsetOf(ChosenStock());
   cmbOutput->setCurrentIndex(pdf.Output == 1 ? 1 : 0);
+  // A stock of the user's that fails its check is not offered; the clerk is told why, rather
+  // than finding it gone.
+  std::string unusable;
+  try {
+    for (const auto& [id, why] : UnusableUserStocks(control_.store())) {
+      unusable += "\nתבנית המדבקות \"" + id + "\" אינה מוצגת ברשימה: " + why;
+    }
+  } catch (const std::exception&) {
+  }
+  if (!unusable.empty()) {
+    control_.ui().ShowMessage("בהגדרות יש תבניות מדבקות שאינן תקינות:" + unusable, kTitleError,
+                              MsgIcon::Exclamation);
+  }
 }
 
 void LabelStockBox::Save() {
@@ -241,7 +254,7 @@ std::string LabelStockBox::CmdApplyReadings_Click() {
         {Tenths(txtReadH1), Tenths(txtReadH2), Tenths(txtReadV1), Tenths(txtReadV2)});
   }
   if (!stock) {
-    problem = LabelStockLookupProblem(control_.store(), ChosenStock());
+    problem = LabelStockChoiceProblem(control_.store(), ChosenStock());
   } else if (!corrected) {
     problem =
         "הקריאות נותנות תיקון מעבר לתחום (היסט עד 10 מ\"מ, קנה מידה עד 100 פרומיל): בדקו את "

@@ -442,8 +442,9 @@ void MainCard::SetTabOrder() {
 // Start-up and the panel's values
 
 void MainCard::Initialize() {
+  std::vector<SettingsValueError> refused;
   try {
-    control_->Initialize();
+    refused = control_->Initialize();
   } catch (...) {
   }
   try {
@@ -451,6 +452,12 @@ void MainCard::Initialize() {
   } catch (...) {
   }
   WritePanel();
+  // The load stops where it must, but the clerk learns which value stopped it: otherwise the
+  // criteria after it look like chosen defaults.
+  if (!refused.empty()) {
+    seam_->ShowMessage(RefusedSettingsMessage(refused, store_.Location()), kTitleError,
+                       MsgIcon::Exclamation);
+  }
 }
 
 void MainCard::InitCmbDocType() {

@@ -35,13 +35,18 @@ frmPostIL::frmPostIL(Control& control, FileChooser& chooser, QWidget* parent)
   for (const char* entry : kFileFormatEntries) CmbFileFormat->addItem(ToQ(entry));
 
   auto* grid = new QGridLayout;
-  grid->addWidget(MakeLabel(QStringLiteral("סוג שירות:"), this), 0, 0);
+  const auto caption = [this](QLineEdit* box, const QString& text) {
+    QLabel* label = MakeLabel(text, this);
+    captionOf_.insert(box, label);
+    return label;
+  };
+  grid->addWidget(caption(txtService, QStringLiteral("סוג שירות:")), 0, 0);
   grid->addWidget(txtService, 0, 1, 1, 2);
-  grid->addWidget(MakeLabel(QStringLiteral("משקל:"), this), 1, 0);
+  grid->addWidget(caption(txtWeight, QStringLiteral("משקל:")), 1, 0);
   grid->addWidget(txtWeight, 1, 1, 1, 2);
-  grid->addWidget(MakeLabel(QStringLiteral("אישור מסירה:"), this), 2, 0);
+  grid->addWidget(caption(txtConfirm, QStringLiteral("אישור מסירה:")), 2, 0);
   grid->addWidget(txtConfirm, 2, 1, 1, 2);
-  grid->addWidget(MakeLabel(QStringLiteral("קובץ הפלט:"), this), 3, 0);
+  grid->addWidget(caption(txtFilePath, QStringLiteral("קובץ הפלט:")), 3, 0);
   grid->addWidget(txtFilePath, 3, 1);
   grid->addWidget(dir, 3, 2);
   grid->addWidget(ChkOpenExcel, 4, 1, 1, 2);
@@ -67,11 +72,16 @@ void frmPostIL::ShowModal() {
 }
 
 void frmPostIL::Load() {
+  std::vector<SettingsValueError> refused;
   try {
-    SetGetRegPostILDefs(kActionLoad, control_.store(), control_.postILSettings());
+    refused = SetGetRegPostILDefs(kActionLoad, control_.store(), control_.postILSettings());
   } catch (...) {
   }
   GetSetFormPostILDefs(1);
+  if (!refused.empty()) {
+    control_.ui().ShowMessage(RefusedSettingsMessage(refused, control_.store().Location()),
+                              kTitleError, MsgIcon::Exclamation);
+  }
 }
 
 void frmPostIL::GetSetFormPostILDefs(uint8_t Action) {
@@ -94,6 +104,31 @@ void frmPostIL::GetSetFormPostILDefs(uint8_t Action) {
 }
 
 void frmPostIL::cmdOK_Click() {
+  // Each box's text goes through the rule of its setting; a refused one keeps the dialog
+  // open on that box, with everything typed still there.
+  const std::pair<QLineEdit*, const char*> boxes[] = {{txtService, "Service"},
+                                                      {txtWeight, "Weight"},
+                                                      {txtConfirm, "Confirm"},
+                                                      {txtFilePath, "FilePath"}};
+  for (const auto& [box, key] : boxes) {
+    PostILSettings scratch;
+    Panel panel;
+    std::string path;
+    const SettingDef& def = *FindSetting(key);
+    const std::string typed = FromQ(box->text());
+    try {
+      ApplySetting(def, typed, {panel, scratch, path});
+    } catch (const SettingsValueError&) {
+      QString name = captionOf_.value(box)->text();
+      if (name.endsWith(QLatin1Char(':'))) name.chop(1);
+      control_.ui().ShowMessage("בתיבה \"" + FromQ(name) + "\" הוקלד \"" + typed +
+                                    "\", שאינו תקין. יש להקליד " + AllowedValues(def),
+                                kTitleError, MsgIcon::Exclamation);
+      box->setFocus();
+      box->selectAll();
+      return;
+    }
+  }
   GetSetFormPostILDefs(2);
   try {
     SetGetRegPostILDefs(kActionSave, control_.store(), control_.postILSettings());

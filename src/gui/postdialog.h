@@ -3,10 +3,12 @@
 #pragma once
 
 #include <QDialog>
+#include <QHash>
 #include <cstdint>
 #include <string_view>
 
 class QComboBox;
+class QLabel;
 class QLineEdit;
 
 namespace zdr {
@@ -47,6 +49,7 @@ class frmPostIL : public QDialog {
  private:
   Control& control_;
   FileChooser& chooser_;
+  QHash<QLineEdit*, QLabel*> captionOf_;  // each text box's caption label
 };
 
 }  // namespace zdr::gui

@@ -53,25 +53,50 @@ std::optional<int16_t> BatchNumberOf(std::string_view name) {
   }
 }
 
+// Reads one batch file, opened by `open`, into tTransact with FileID pJournalNo; -1 when it
+// was read to its end, 0 after showing a failure.
+template <typename OpenFile>
+int16_t ReadBatch(OpenFile open, const std::string& pDBFile, int16_t pJournalNo, bool pAsIs,
+                  const Panel& panel, UserSeam& ui) {
+  try {
+    importing::LedgerFilter filter(panel);
+
+    const HostRecordFile file = open();
+    importing::ImportTransactions(file, kLayout, pDBFile, pJournalNo, filter, pAsIs, ui,
+                                  [](std::string_view) { return true; });
+    return -1;
+  } catch (const std::exception& e) {
+    ui.ShowMessage(e.what(), kTitleFault, MsgIcon::Information);
+    return 0;
+  }
+}
+
 }  // namespace
 
-void ReadAllTempTrans(const std::string& CompPath, const std::string& pDBFile, bool pAsIs,
-                      const Panel& panel, UserSeam& ui) {
+int ReadAllTempTrans(const std::string& CompPath, const std::string& pDBFile, bool pAsIs,
+                     const Panel& panel, UserSeam& ui) {
   const importing::JournalRange journals = importing::JournalRange::FromPanel(panel);
 
   // Listed in the order the folder gives them. A folder that cannot be listed has no batches.
+  int failed = 0;
   std::error_code ec;
   std::filesystem::directory_iterator it(CompPath, ec);
-  if (ec) return;
+  if (ec) return failed;
   for (const std::filesystem::directory_entry& entry : it) {
     std::error_code typeEc;
-    if (!entry.is_regular_file(typeEc)) continue;
+    if (entry.is_directory(typeEc)) continue;
     const std::string name = entry.path().filename().string();
     const std::optional<int16_t> batch = BatchNumberOf(name);
     if (!batch || *batch == 0 || !journals.Contains(*batch)) continue;
     // The file the listing found is read: a012.tmp is batch 12 but is not the file a12.tmp.
-    ReadTempTransactions(CompPath, pDBFile, *batch, name, pAsIs, panel, ui);
+    // A FIFO or a device in a batch's place is opened without waiting and refused there.
+    const std::filesystem::path path = entry.path();
+    if (ReadBatch([&path] { return HostRecordFile(path, kBatchRecord); }, pDBFile, *batch, pAsIs,
+                  panel, ui) == 0) {
+      ++failed;
+    }
   }
+  return failed;
 }
 
 int16_t ReadTempTransactions(const std::string& CompPath, const std::string& pDBFile,
@@ -85,17 +110,8 @@ int16_t ReadTempTransactions(const std::string& CompPath, const std::string& pDB
 int16_t ReadTempTransactions(const std::string& CompPath, const std::string& pDBFile,
                              int16_t pJournalNo, const std::string& pFileName, bool pAsIs,
                              const Panel& panel, UserSeam& ui) {
-  try {
-    importing::LedgerFilter filter(panel);
-
-    const HostRecordFile file(CompPath, pFileName, kBatchRecord);
-    importing::ImportTransactions(file, kLayout, pDBFile, pJournalNo, filter, pAsIs, ui,
-                                  [](std::string_view) { return true; });
-    return -1;
-  } catch (const std::exception& e) {
-    ui.ShowMessage(e.what(), kTitleFault, MsgIcon::Information);
-    return 0;
-  }
+  return ReadBatch([&] { return HostRecordFile(CompPath, pFileName, kBatchRecord); }, pDBFile,
+                   pJournalNo, pAsIs, panel, ui);
 }
 
 }  // namespace zdr

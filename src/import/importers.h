@@ -9,7 +9,8 @@
 //   appended through one prepared statement inside one transaction; rows appended before a
 //   failure stay.
 // - A failure is shown through `ui` (its text, title and icon are each importer's own) and the
-//   importer returns normally; only ReadAllTempTrans lets errors of its own steps escape.
+//   importer returns normally, saying so in its result; only ReadAllTempTrans lets errors of
+//   its own steps escape. Callers decide from the result, never from the message shown.
 // - A second row with a key already in the table is passed over silently.
 // - Progress goes to `ui.SetProgress`, 0 at the start and at the end.
 // - Parameters in one order: the host routine's own (company folder, database, then the
@@ -39,8 +40,9 @@ bool ReadACT(const std::string& CompPath, const std::string& pDBFile, bool pAllD
              Panel& panel, UserSeam& ui);
 
 // Items of the panel's item ranges from ITM.fix into tItem, then marks tStockHead.Include True
-// for exactly the headers with a line of such an item. Failures: information icon, "תקלה".
-void ReadItem(const std::string& CompPath, const std::string& pDBFile, const Panel& panel,
+// for exactly the headers with a line of such an item. Returns true when both were done,
+// false after showing a failure (information icon, "תקלה").
+bool ReadItem(const std::string& CompPath, const std::string& pDBFile, const Panel& panel,
               UserSeam& ui);
 
 // Documents of row `pDocTypeIndex` of `docTypes` dated pFromDate..pToDate (texts as typed; one
@@ -66,11 +68,13 @@ int16_t ReadTransactions(const std::string& CompPath, const std::string& pDBFile
                          const Panel& panel, UserSeam& ui);
 
 // Lists the company's temporary batches (a<number>.tmp, any case) and reads each whose number
-// is not 0 and lies in the panel's journal range with ReadTempTransactions. Names whose middle
-// is not a number, or a number outside the 16-bit range, are passed over. Throws what it does
+// is not 0 and lies in the panel's journal range as ReadTempTransactions does. Names whose
+// middle is not a number, or a number outside the 16-bit range, and folders are passed over;
+// a FIFO or device under a batch's name is reported as an unreadable batch. Returns the number
+// of batches that failed (each shown as ReadTempTransactions shows it). Throws what it does
 // not handle itself: a journal bound that is not a 16-bit whole number.
-void ReadAllTempTrans(const std::string& CompPath, const std::string& pDBFile, bool pAsIs,
-                      const Panel& panel, UserSeam& ui);
+int ReadAllTempTrans(const std::string& CompPath, const std::string& pDBFile, bool pAsIs,
+                     const Panel& panel, UserSeam& ui);
 
 // Transactions of batch `pJournalNo` (the file a<pJournalNo>.tmp) that pass the type pattern
 // and both date ranges into tTransact with FileID pJournalNo. Returns -1 / 0 as

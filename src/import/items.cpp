@@ -42,7 +42,7 @@ std::string SortBound(const std::string& typed) {
 
 }  // namespace
 
-void ReadItem(const std::string& CompPath, const std::string& pDBFile, const Panel& panel,
+bool ReadItem(const std::string& CompPath, const std::string& pDBFile, const Panel& panel,
               UserSeam& ui) {
   try {
     HostRecordFile file(CompPath, "ITM.fix", kItemRecord);
@@ -87,8 +87,10 @@ void ReadItem(const std::string& CompPath, const std::string& pDBFile, const Pan
     db.Execute(kClearMarks);
     db.Execute(MarkStatement());
     db.Close();
+    return true;
   } catch (const std::exception& e) {
     ui.ShowMessage(e.what(), kTitleFault, MsgIcon::Information);
+    return false;
   }
 }
 

@@ -13,6 +13,7 @@
 #include <filesystem>
 #include <memory>
 
+#include "common/diskfull.h"
 #include "hosttext/codepage.h"
 #include "hosttext/hosttext.h"
 #include "output/outputinternal.h"
@@ -56,7 +57,8 @@ CodePageFile::CodePageFile(const std::string& path, Unmappable mode) : path_(pat
       throw OutputError("לא ניתן למחוק את הקובץ הקודם " + path + ": " + std::strerror(errno));
     }
   }
-  const int fd = ::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0666);
+  // Readable by its owner only, like the working database: it holds the same names.
+  const int fd = ::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0600);
   if (fd >= 0) file_ = ::fdopen(fd, "wb");
   if (file_ == nullptr) {
     const int err = errno;
@@ -68,9 +70,10 @@ CodePageFile::CodePageFile(const std::string& path, Unmappable mode) : path_(pat
 }
 
 CodePageFile::~CodePageFile() {
+  // Not closed: the writer failed. Half a page or file is worse than none.
   if (file_ != nullptr) {
-    if (!buf_.empty()) std::fwrite(buf_.data(), 1, buf_.size(), file_);
     std::fclose(file_);
+    ::unlink(path_.c_str());
   }
 }
 
@@ -116,9 +119,14 @@ void CodePageFile::Flush() {
   if (std::fwrite(buf_.data(), 1, buf_.size(), file_) != buf_.size()) {
     const int err = errno;
     buf_.clear();
-    throw OutputError("כתיבת הקובץ " + path_ + " נכשלה: " + std::strerror(err));
+    FailWrite(err);
   }
   buf_.clear();
+}
+
+void CodePageFile::FailWrite(int err) {
+  if (err == ENOSPC || err == EDQUOT) throw OutputError(DiskFullMessage(path_));
+  throw OutputError("כתיבת הקובץ " + path_ + " נכשלה: " + std::strerror(err));
 }
 
 void CodePageFile::Close() {
@@ -127,7 +135,9 @@ void CodePageFile::Close() {
   std::FILE* f = file_;
   file_ = nullptr;
   if (std::fclose(f) != 0) {
-    throw OutputError("כתיבת הקובץ " + path_ + " נכשלה: " + std::strerror(errno));
+    const int err = errno;
+    ::unlink(path_.c_str());
+    FailWrite(err);
   }
 }
 

@@ -24,6 +24,7 @@
 #include "hostfile/doctypes.h"
 #include "output/outputdefs.h"
 #include "output/preflight.h"
+#include "output/targetfile.h"
 
 namespace zdr {
 
@@ -58,24 +59,19 @@ void CreateCSV(const std::string& pFileName, const std::string& pDBFile, int16_t
 void CreateCSV(const std::string& pFileName, db::Snapshot& recipients, int16_t pFileFormat,
                const PostILSettings& settings, UserSeam& ui, Date today = Today());
 
-// Checks, before anything is loaded or written, that a workbook can be saved at `pXlsFile`:
-// it is not a folder, not inside the company folder `companyPath` (links resolved), not named
-// as a host file (*.fix, a*.tmp), its extension is .xlsx, or .xls or .ods with LibreOffice
-// installed, and its folder exists. Throws OutputError saying what is wrong.
-void CheckWorkbookTarget(const std::string& pXlsFile, const std::string& companyPath);
-
 // Saves the dispatch file `pCsvFile` as a workbook at `pXlsFile`: ".xlsx" directly, ".xls"
 // and ".ods" through LibreOffice. The header row and every value are text except the
-// reference column, which is a number. The target is checked as CheckWorkbookTarget does;
-// the workbook is written to a new file beside it and renamed over it only when complete,
-// so on any failure the old file stays as it was. With `pOpenExcel` the sheet reads right
-// to left and the workbook is handed to ui.OpenInSpreadsheet. Throws OutputError.
+// reference column, which is a number. The target is checked by CheckOutputTarget (kind
+// kWorkbook, `companyFolders`); the workbook is written through a ReplacingFile beside the
+// file a link at the target points to, so on any failure the old file stays as it was. With
+// `pOpenExcel` the sheet reads right to left and the workbook is handed to ui.OpenInSpreadsheet.
+// Throws OutputError.
 //
 // When there are `findings`, the workbook gains a second sheet, "בדיקה", listing them under
 // kFindingHeadings, right to left, every cell text; the dispatch sheet is the same with or
 // without it. With `showFindings` the workbook opens on the findings sheet.
 void ConvertToExcel(const std::string& pCsvFile, const std::string& pXlsFile, bool pOpenExcel,
-                    UserSeam& ui, const std::string& companyPath = {},
+                    UserSeam& ui, const std::vector<std::string>& companyFolders = {},
                     const std::vector<Finding>& findings = {}, bool showFindings = false);
 
 }  // namespace zdr

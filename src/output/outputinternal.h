@@ -5,6 +5,7 @@
 
 #include <cstdint>
 #include <cstdio>
+#include <filesystem>
 #include <string>
 #include <string_view>
 
@@ -67,6 +68,16 @@ inline constexpr std::string_view kFindingsSheetName = "בדיקה";
 // Pieces the writers share.
 namespace output_internal {
 
+// True when LibreOffice, which writes the .xls and .ods workbooks, is installed.
+bool OfficeConverterInstalled();
+
+// ASCII letters in lower case, other bytes as they are.
+std::string LowerAscii(std::string s);
+// A path from UTF-8 text.
+std::filesystem::path PathFromUtf8(const std::string& s);
+// The path with every symbolic link resolved, as far as it exists.
+std::filesystem::path ResolvedPath(const std::filesystem::path& p);
+
 // Column indexes of the fields a label prints, in a recipients snapshot (the label sheet and
 // the label PDF print the same fields).
 struct LabelFields {
@@ -80,9 +91,11 @@ enum class Unmappable {
   kFail,     // OutputError (the dispatch file)
 };
 
-// An output file in Windows-1255. The constructor deletes an old file at `path` and creates
-// the new one; text is gathered in a buffer and written in large blocks. Close() flushes and
-// reports a failed write; the destructor closes without reporting.
+// An output file in Windows-1255, readable by its owner only. The constructor deletes an old
+// file at `path` and creates the new one; text is gathered in a buffer and written in large
+// blocks. Close() flushes and reports a failed write (a full disk in DiskFullMessage's words)
+// and then leaves no file; so does the destructor of a file never closed, which is how a
+// failed writer ends.
 class CodePageFile {
  public:
   CodePageFile(const std::string& path, Unmappable mode);
@@ -103,6 +116,7 @@ class CodePageFile {
  private:
   void Flush();
   [[noreturn]] void FailChar(char32_t cp);
+  [[noreturn]] void FailWrite(int err);
 
   std::string path_;
   Unmappable mode_;

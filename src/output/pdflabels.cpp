@@ -24,9 +24,11 @@
 #include <unordered_map>
 #include <vector>
 
+#include "common/diskfull.h"
 #include "engine/engine.h"
 #include "output/outputinternal.h"
 #include "output/picture.h"
+#include "output/targetfile.h"
 #include "select/select.h"
 
 namespace zdr {
@@ -55,22 +57,19 @@ using FontDescPtr = std::unique_ptr<PangoFontDescription,
                                     Deleter<PangoFontDescription, pango_font_description_free>>;
 using ObjectPtr = std::unique_ptr<void, Deleter<void, UnrefObject>>;
 
-// ---- The file: written under a temporary name beside the target, then renamed ----------
+// ---- The file: written beside the target with no name, then put in its place ------------
 
 class PdfFile {
  public:
-  PdfFile(const std::string& target, double widthPt, double heightPt) : target_(target) {
-    std::string pattern = target + ".XXXXXX";
-    const int fd = mkstemp(pattern.data());
-    if (fd < 0) {
-      throw OutputError("לא ניתן ליצור את הקובץ " + target + ": " + std::strerror(errno));
-    }
-    temp_ = pattern;
-    file_ = fdopen(fd, "wb");
+  // The labels hold the customers' names: the file is readable by its owner only.
+  PdfFile(const std::string& target, double widthPt, double heightPt)
+      : target_(target), out_(target, ReplacingFile::Access::kOwnerOnly) {
+    const int fd = ::dup(out_.fd());
+    file_ = fd >= 0 ? fdopen(fd, "wb") : nullptr;
     if (file_ == nullptr) {
-      ::close(fd);
-      ::unlink(temp_.c_str());
-      throw OutputError("לא ניתן ליצור את הקובץ " + target + ": " + std::strerror(errno));
+      const int err = errno;
+      if (fd >= 0) ::close(fd);
+      throw OutputError("לא ניתן ליצור את הקובץ " + target + ": " + std::strerror(err));
     }
     surface_.reset(cairo_pdf_surface_create_for_stream(&PdfFile::Write, this, widthPt, heightPt));
     cairo_pdf_surface_restrict_to_version(surface_.get(), CAIRO_PDF_VERSION_1_5);
@@ -81,7 +80,6 @@ class PdfFile {
     cr_.reset();
     surface_.reset();
     if (file_ != nullptr) std::fclose(file_);
-    if (!temp_.empty()) ::unlink(temp_.c_str());
   }
   PdfFile(const PdfFile&) = delete;
   PdfFile& operator=(const PdfFile&) = delete;
@@ -103,14 +101,8 @@ class PdfFile {
     std::FILE* f = file_;
     file_ = nullptr;
     const bool closed = std::fclose(f) == 0;
-    if (!closed || writeError_ != 0) {
-      throw OutputError("כתיבת הקובץ " + target_ +
-                        " נכשלה: " + std::strerror(writeError_ != 0 ? writeError_ : errno));
-    }
-    if (std::rename(temp_.c_str(), target_.c_str()) != 0) {
-      throw OutputError("לא ניתן לשמור את הקובץ " + target_ + ": " + std::strerror(errno));
-    }
-    temp_.clear();
+    if (!closed || writeError_ != 0) FailWrite(writeError_ != 0 ? writeError_ : errno);
+    out_.Commit();
   }
 
  private:
@@ -125,15 +117,19 @@ class PdfFile {
 
   void Check() {
     const cairo_status_t s = cr_ ? cairo_status(cr_.get()) : cairo_surface_status(surface_.get());
-    if (s != CAIRO_STATUS_SUCCESS || writeError_ != 0) {
-      throw OutputError("כתיבת הקובץ " + target_ + " נכשלה: " +
-                        (writeError_ != 0 ? std::string(std::strerror(writeError_))
-                                          : std::string(cairo_status_to_string(s))));
+    if (writeError_ != 0) FailWrite(writeError_);
+    if (s != CAIRO_STATUS_SUCCESS) {
+      throw OutputError("כתיבת הקובץ " + target_ + " נכשלה: " + cairo_status_to_string(s));
     }
   }
 
+  [[noreturn]] void FailWrite(int err) {
+    if (err == ENOSPC || err == EDQUOT) throw OutputError(DiskFullMessage(target_));
+    throw OutputError("כתיבת הקובץ " + target_ + " נכשלה: " + std::strerror(err));
+  }
+
   std::string target_;
-  std::string temp_;
+  ReplacingFile out_;
   std::FILE* file_ = nullptr;
   int writeError_ = 0;
   SurfacePtr surface_;

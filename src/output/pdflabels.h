@@ -13,9 +13,10 @@
 // reading ends; lines too tall together shrink alike, and what still does not fit is left
 // out (a message says on how many labels). Nothing is drawn outside a label's box.
 //
-// The file is written beside its target under a temporary name and renamed over it when
-// complete, so an existing file (or a link in its place) is replaced, never written
-// through, and a failed run leaves the old file as it was.
+// The file is written through a ReplacingFile (output/targetfile.h), readable by its owner
+// only: an existing file (or a link in its place) is replaced when the new one is complete,
+// never written through, and a failed run leaves the old file as it was. The caller checks
+// the target first (CheckOutputTarget).
 //
 // Failures throw OutputError (Hebrew description): an unusable stock, no labels to print
 // (no recipients, or copies 0), a file that cannot be written; db::EngineError for the

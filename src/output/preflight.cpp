@@ -46,16 +46,43 @@ bool AllDigits(std::string_view s) {
   return true;
 }
 
-// 9 or 10 digits beginning with 0, dashes and blanks not counted.
+// 9 or 10 digits beginning with 0, or a 1-700 or 1-800 number of 10 digits, dashes and
+// blanks not counted; "+972" before the number stands for its leading 0.
 bool IsIsraeliTelephone(std::string_view s) {
   std::string digits;
-  for (const char c : s) {
+  bool international = false;
+  for (const char c : Trim(s)) {
     if (c == '-' || c == ' ') continue;
+    if (c == '+' && digits.empty() && !international) {
+      international = true;
+      continue;
+    }
     if (c < '0' || c > '9') return false;
     digits += c;
   }
+  if (international) {
+    if (!digits.starts_with("972")) return false;
+    digits.replace(0, 3, 1, '0');
+  }
+  if (digits.size() == 10 && (digits.starts_with("1700") || digits.starts_with("1800"))) {
+    return !international;
+  }
   return (digits.size() == 9 || digits.size() == 10) && digits[0] == '0';
 }
+
+}  // namespace
+
+bool IsDispatchWeight(std::string_view s) {
+  if (s.empty()) return true;
+  const size_t point = s.find('.');
+  const std::string_view whole = s.substr(0, point);
+  const std::string_view part = point == std::string_view::npos ? "" : s.substr(point + 1);
+  if (whole.empty() || !AllDigits(whole)) return false;
+  if (point != std::string_view::npos && (part.empty() || !AllDigits(part))) return false;
+  return s.find_first_of("123456789") != std::string_view::npos;
+}
+
+namespace {
 
 // A character the file cannot carry: one Windows-1255 has no byte for (the writer refuses
 // the whole file), one of the code page's undefined bytes, or a control character.
@@ -91,6 +118,13 @@ std::string UncarriedCharacters(std::string_view text) {
     }
   }
   return out;
+}
+
+// The first `n` characters of `s`.
+std::string Utf8Prefix(std::string_view s, size_t n) {
+  size_t pos = 0;
+  for (size_t i = 0; i < n && pos < s.size(); ++i) NextCodePoint(s, pos);
+  return std::string(s.substr(0, pos));
 }
 
 struct RowFields {
@@ -176,6 +210,23 @@ class Checker {
     AddCharacters(RuleOf(RuleId::kRemarksCut).field, remarks);
   }
 
+  // The dispatch settings' columns of layout 0, the same on every row: found once, row 0.
+  void CheckFixed(const PostILSettings& fixed) {
+    row_ = 0;
+    key_.clear();
+    const std::pair<std::string_view, const std::string*> columns[] = {
+        {"סוג שירות", &fixed.Service}, {"משקל", &fixed.Weight}, {"אישור מסירה", &fixed.Confirm}};
+    for (const auto& [caption, text] : columns) {
+      const FieldText f(db::Value{*text}, 0);
+      if (text == &fixed.Weight && !IsDispatchWeight(*text)) Add(RuleId::kWeightMalformed, *text);
+      if (Utf8Length(f.written) > kWorkbookCellLength) {
+        Add(RuleId::kFixedTooLong, Utf8Prefix(*text, 40) + "...",
+            std::to_string(Utf8Length(f.written)) + " תווים", caption);
+      }
+      AddCharacters(caption, f);
+    }
+  }
+
  private:
   void Add(RuleId id, std::string value, std::string_view detail = {},
            std::string_view field = {}) {
@@ -243,36 +294,40 @@ std::string_view SeverityText(Severity s) {
 
 namespace {
 // The checks over the rows of `rs` from where it stands.
-PreflightResult CheckRows(db::Snapshot& rs, int16_t pFileFormat, bool zipCarried, UserSeam& ui);
+PreflightResult CheckRows(db::Snapshot& rs, int16_t pFileFormat, bool zipCarried,
+                          const PostILSettings& fixed, UserSeam& ui);
 }  // namespace
 
 PreflightResult RunPreflight(const std::string& pDBFile, int16_t pFileFormat, const Panel& panel,
                              const DocTypeTable& docTypes, const std::string& selectDbPath,
-                             UserSeam& ui) {
+                             UserSeam& ui, const PostILSettings& fixed) {
   ProgressReporter started(ui, 1);
   if (pFileFormat != 0 && pFileFormat != 1) return {};  // CreateCSV writes no rows
   db::Database database = db::Database::Open(pDBFile);
   db::Snapshot rs = database.OpenSnapshot(BuildRecipientsStatement(panel, docTypes, selectDbPath),
                                           db::SnapshotKind::Forward);
-  return CheckRows(rs, pFileFormat, !AddressFromDocumentHeader(panel, docTypes), ui);
+  return CheckRows(rs, pFileFormat, !AddressFromDocumentHeader(panel, docTypes), fixed, ui);
 }
 
 PreflightResult RunPreflight(db::Snapshot& recipients, int16_t pFileFormat, const Panel& panel,
-                             const DocTypeTable& docTypes, UserSeam& ui) {
+                             const DocTypeTable& docTypes, UserSeam& ui,
+                             const PostILSettings& fixed) {
   ProgressReporter started(ui, 1);
   if (pFileFormat != 0 && pFileFormat != 1) return {};
   if (recipients.TotalRows() > 0) recipients.MoveFirst();
-  return CheckRows(recipients, pFileFormat, !AddressFromDocumentHeader(panel, docTypes), ui);
+  return CheckRows(recipients, pFileFormat, !AddressFromDocumentHeader(panel, docTypes), fixed, ui);
 }
 
 namespace {
 
-PreflightResult CheckRows(db::Snapshot& rs, int16_t pFileFormat, bool zipCarried, UserSeam& ui) {
+PreflightResult CheckRows(db::Snapshot& rs, int16_t pFileFormat, bool zipCarried,
+                          const PostILSettings& fixed, UserSeam& ui) {
   PreflightResult result;
   if (rs.AtStart() || rs.AtEnd()) return result;
   const int64_t count = rs.TotalRows();
   const RowFields fields(rs);
   Checker checker(pFileFormat, zipCarried, count, result);
+  if (pFileFormat == 0) checker.CheckFixed(fixed);
   ProgressReporter progress(ui, static_cast<double>(count));
   while (!rs.AtEnd()) {
     ++result.rows;
@@ -287,7 +342,7 @@ PreflightResult CheckRows(db::Snapshot& rs, int16_t pFileFormat, bool zipCarried
 
 std::array<std::string, 6> FindingCells(const Finding& f) {
   return {std::string(SeverityText(f.severity)),
-          std::to_string(f.row),
+          f.row == 0 ? std::string("כל השורות") : std::to_string(f.row),
           f.accountKey,
           f.field,
           f.value,

@@ -25,6 +25,7 @@
 #include "common/panel.h"
 #include "common/userseam.h"
 #include "hostfile/doctypes.h"
+#include "output/outputdefs.h"
 
 namespace zdr::db {
 class Snapshot;
@@ -53,6 +54,8 @@ enum class RuleId {
   kRemarksCut,
   kDuplicate,
   kCharacter,
+  kWeightMalformed,
+  kFixedTooLong,
 };
 
 struct PreflightRule {
@@ -65,7 +68,7 @@ struct PreflightRule {
 
 // The rules, in the order a row's findings are listed. Field captions, checks and messages
 // are Hebrew (UTF-8).
-inline constexpr std::array<PreflightRule, 13> kPreflightRules{{
+inline constexpr std::array<PreflightRule, 15> kPreflightRules{{
     {RuleId::kNameMissing, "שם", "קיים", Severity::kError, "חסר שם הנמען"},
     {RuleId::kAddressMissing, "כתובת", "קיימת", Severity::kError, "חסרה כתובת (רחוב)"},
     {RuleId::kCityMissing, "יישוב", "קיים", Severity::kError, "חסר יישוב"},
@@ -73,8 +76,9 @@ inline constexpr std::array<PreflightRule, 13> kPreflightRules{{
     {RuleId::kZipMalformed, "מיקוד", "5 או 7 ספרות", Severity::kError,
      "המיקוד אינו בן 5 או 7 ספרות"},
     {RuleId::kTelephoneMalformed, "טלפון",
-     "ריק, או 9 או 10 ספרות המתחילות ב-0 (מקפים ורווחים אינם נספרים)", Severity::kError,
-     "הטלפון אינו מספר ישראלי"},
+     "ריק, או 9 או 10 ספרות המתחילות ב-0, או מספר 1-700 או 1-800 בן 10 ספרות; +972 נקרא כ-0 "
+     "(מקפים ורווחים אינם נספרים)",
+     Severity::kError, "הטלפון אינו מספר ישראלי"},
     {RuleId::kNameCut, "שם", "עד 25 תווים (דואר ישראל)", Severity::kWarning, "השם נחתך ל-25 תווים"},
     {RuleId::kAddressCut, "כתובת", "עד 40 תווים (דואר ישראל)", Severity::kWarning,
      "הכתובת נחתכה ל-40 תווים"},
@@ -87,7 +91,19 @@ inline constexpr std::array<PreflightRule, 13> kPreflightRules{{
      Severity::kWarning, "אותו שם וכתובת כבר מופיעים בקובץ"},
     {RuleId::kCharacter, "כל שדה", "רק תווים שקובץ בקידוד Windows-1255 נושא", Severity::kError,
      "תווים שהקובץ אינו יכול לשאת"},
+    {RuleId::kWeightMalformed, "משקל", "ריק, או מספר חיובי עם נקודה עשרונית (דואר ישראל)",
+     Severity::kError, "המשקל אינו מספר חיובי"},
+    {RuleId::kFixedTooLong, "סוג שירות, משקל, אישור מסירה",
+     "עד 32767 תווים, שתא בגיליון העבודה מכיל (דואר ישראל)", Severity::kError,
+     "הערך ארוך מכפי שתא בגיליון העבודה מכיל"},
 }};
+
+// True for a weight the dispatch file may carry: empty, or a positive number written with
+// digits and at most one decimal point between digits ("0.5", "2").
+bool IsDispatchWeight(std::string_view s);
+
+// The longest text a cell of the workbook holds.
+inline constexpr size_t kWorkbookCellLength = 32767;
 
 const PreflightRule& RuleOf(RuleId id);
 // "שגיאה" or "אזהרה".
@@ -97,7 +113,7 @@ struct Finding {
   RuleId rule;
   Severity severity;
   // The row of the dispatch file, and of its workbook sheet: the header is row 1, the first
-  // recipient row 2.
+  // recipient row 2. 0: every row (a fixed column of the dispatch settings).
   int64_t row = 0;
   std::string accountKey;  // UTF-8
   std::string field;       // the field's caption; for the character rule, the field it found
@@ -113,23 +129,25 @@ struct PreflightResult {
 };
 
 // Checks the rows CreateCSV writes for the same arguments, in the same order: no rows when
-// there are no recipients or `pFileFormat` is neither 0 nor 1. Reads the working database
-// at `pDBFile`; writes nothing. Reports progress through `ui` (0 at the start and the end).
-// Throws db::EngineError for a database or statement the engine rejects and
-// std::out_of_range for a document-type row outside the table.
+// there are no recipients or `pFileFormat` is neither 0 nor 1. With rows in layout 0, the
+// fixed columns every row carries (`fixed`: Service, Weight, Confirm) are checked first,
+// once, as findings of row 0. Reads the working database at `pDBFile`; writes nothing. Reports
+// progress through `ui` (0 at the start and the end). Throws db::EngineError for a database or
+// statement the engine rejects and std::out_of_range for a document-type row outside the table.
 PreflightResult RunPreflight(const std::string& pDBFile, int16_t pFileFormat, const Panel& panel,
                              const DocTypeTable& docTypes, const std::string& selectDbPath,
-                             UserSeam& ui);
+                             UserSeam& ui, const PostILSettings& fixed = {});
 // The same checks over `recipients`, the rows of the recipients statement, read from the
 // first row to the end; the caller may read them again (MoveFirst) for the dispatch file.
 PreflightResult RunPreflight(db::Snapshot& recipients, int16_t pFileFormat, const Panel& panel,
-                             const DocTypeTable& docTypes, UserSeam& ui);
+                             const DocTypeTable& docTypes, UserSeam& ui,
+                             const PostILSettings& fixed = {});
 
 // The findings sheet's and the findings CSV's column headings, in order.
 inline constexpr std::array<std::string_view, 6> kFindingHeadings{"חומרה", "שורה", "מפתח חשבון",
                                                                   "שדה",   "ערך",  "הודעה"};
 
-// A finding's six cells, in the order of kFindingHeadings.
+// A finding's six cells, in the order of kFindingHeadings; row 0 reads "כל השורות".
 std::array<std::string, 6> FindingCells(const Finding& f);
 
 // The findings as CSV: UTF-8, the heading line first, LF line ends, a cell holding a comma,

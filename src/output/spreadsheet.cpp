@@ -21,6 +21,7 @@
 
 #include "hosttext/codepage.h"
 #include "output/outputinternal.h"
+#include "output/targetfile.h"
 
 extern char** environ;
 
@@ -29,10 +30,9 @@ namespace {
 
 namespace fs = std::filesystem;
 
-std::string Lower(std::string s) {
-  for (char& c : s) c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
-  return s;
-}
+using output_internal::LowerAscii;
+using output_internal::PathFromUtf8;
+using output_internal::ResolvedPath;
 
 // Splits at every comma (the file quotes nothing) into `cells`, reusing its strings.
 void SplitCsvLine(std::string_view line, std::vector<std::string>& cells) {
@@ -214,96 +214,11 @@ fs::path TempDir() {
   return fs::temp_directory_path();
 }
 
-fs::path PathFromUtf8(const std::string& s) {
-  return fs::path(std::u8string(s.begin(), s.end()));
-}
-
 std::string FindOffice() {
   std::string office = FindOnPath("soffice");
   if (office.empty()) office = FindOnPath("libreoffice");
   return office;
 }
-
-// Formats LibreOffice writes for us; .xlsx is written here directly.
-bool ConvertedByOffice(const std::string& lowerExt) {
-  return lowerExt == ".xls" || lowerExt == ".ods";
-}
-
-// The path with every symbolic link resolved, as far as it exists.
-fs::path Resolved(const fs::path& p) {
-  std::error_code ec;
-  fs::path abs = fs::absolute(p, ec);
-  if (ec) return p.lexically_normal();
-  fs::path canon = fs::weakly_canonical(abs, ec);
-  return ec ? abs.lexically_normal() : canon;
-}
-
-bool IsWithin(const fs::path& path, const fs::path& folder) {
-  auto p = path.begin();
-  for (auto f = folder.begin(); f != folder.end(); ++f, ++p) {
-    if (f->empty() && std::next(f) == folder.end()) break;  // a trailing separator
-    if (p == path.end() || *p != *f) return false;
-  }
-  return true;
-}
-
-// The names the host accounting system gives its files: record files "*.fix" (ACT.fix,
-// ADF.FIX, amv.fix ...) and the temporary batches "a*.tmp".
-bool IsHostFileName(const fs::path& p) {
-  const std::string name = Lower(p.filename().string());
-  const auto endsWith = [&](std::string_view tail) {
-    return name.size() >= tail.size() &&
-           name.compare(name.size() - tail.size(), tail.size(), tail) == 0;
-  };
-  return endsWith(".fix") || (name.size() > 5 && name[0] == 'a' && endsWith(".tmp"));
-}
-
-// A new file beside the target that the workbook is written into. Commit() renames it over
-// the target; until then, and when the run fails, the old target stays as it was and the
-// new file is removed.
-class PendingFile {
- public:
-  explicit PendingFile(const fs::path& target) : target_(target) {
-    std::string name = ".";
-    name += target.filename().string();
-    name += ".XXXXXX";
-    std::string pattern = (target.parent_path() / name).string();
-    const int fd = ::mkstemp(pattern.data());
-    if (fd < 0) {
-      throw OutputError("לא ניתן ליצור קובץ בתיקייה של " + target.string() + ": " +
-                        std::strerror(errno));
-    }
-    // mkstemp makes the file private; give it the mode a new file of this user gets.
-    const mode_t mask = ::umask(0);
-    ::umask(mask);
-    ::fchmod(fd, 0666 & ~mask);
-    ::close(fd);
-    path_ = pattern;
-  }
-  ~PendingFile() {
-    if (!path_.empty()) {
-      std::error_code ec;
-      fs::remove(path_, ec);
-    }
-  }
-  PendingFile(const PendingFile&) = delete;
-  PendingFile& operator=(const PendingFile&) = delete;
-
-  const fs::path& path() const { return path_; }
-
-  void Commit() {
-    std::error_code ec;
-    fs::rename(path_, target_, ec);
-    if (ec) {
-      throw OutputError("לא ניתן לשמור את הקובץ " + target_.string() + ": " + ec.message());
-    }
-    path_.clear();
-  }
-
- private:
-  fs::path target_;
-  fs::path path_;
-};
 
 void ConvertWithOffice(const std::string& csvPath, const fs::path& target, const fs::path& into,
                        bool rightToLeft, const std::vector<Finding>& findings, bool showFindings) {
@@ -337,60 +252,36 @@ void ConvertWithOffice(const std::string& csvPath, const fs::path& target, const
   if (rc != 0 || !fs::exists(produced, ec)) {
     throw OutputError("ההמרה לתבנית " + ext + " נכשלה. יש לבחור קובץ פלט שסיומתו .xlsx");
   }
-  fs::copy_file(produced, into, fs::copy_options::overwrite_existing, ec);
-  if (ec) throw OutputError("לא ניתן לשמור את הקובץ " + target.string() + ": " + ec.message());
+  // Copied through the writer's name for the new file, which may be one with no file name.
+  std::ifstream from(produced, std::ios::binary);
+  std::ofstream to(into, std::ios::binary | std::ios::trunc);
+  to << from.rdbuf();
+  to.close();
+  if (!from || !to) throw OutputError("לא ניתן לשמור את הקובץ " + target.string());
 }
 
 }  // namespace
 
-void CheckWorkbookTarget(const std::string& pXlsFile, const std::string& companyPath) {
-  if (pXlsFile.empty()) throw OutputError("לא הוגדר קובץ פלט");
-  const fs::path target = PathFromUtf8(pXlsFile);
-  const fs::path resolved = Resolved(target);
-  std::error_code ec;
-  if (fs::is_directory(resolved, ec)) {
-    throw OutputError("קובץ הפלט " + pXlsFile + " הוא תיקייה. יש לבחור שם של קובץ");
-  }
-  if (!companyPath.empty() && IsWithin(resolved, Resolved(PathFromUtf8(companyPath)))) {
-    throw OutputError("קובץ הפלט " + pXlsFile +
-                      " נמצא בתיקיית החברה. יש לבחור קובץ פלט מחוץ לתיקיית הנהלת החשבונות");
-  }
-  if (IsHostFileName(resolved) || IsHostFileName(target)) {
-    throw OutputError("קובץ הפלט " + pXlsFile +
-                      " הוא בשם של קובץ הנהלת חשבונות. יש לבחור קובץ פלט שסיומתו .xlsx");
-  }
-  const std::string ext = Lower(target.extension().string());
-  if (ext.size() < 2) {
-    throw OutputError("לקובץ הפלט " + pXlsFile + " אין סיומת. יש לבחור קובץ פלט שסיומתו .xlsx");
-  }
-  if (ext != ".xlsx" && !ConvertedByOffice(ext)) {
-    throw OutputError("לא ניתן לכתוב גיליון עבודה בתבנית " + target.extension().string() +
-                      ". יש לבחור קובץ פלט שסיומתו .xlsx, .xls או .ods");
-  }
-  if (ext != ".xlsx" && FindOffice().empty()) {
-    throw OutputError("לא נמצאה תוכנה שממירה לתבנית " + target.extension().string() +
-                      ". יש לבחור קובץ פלט שסיומתו .xlsx");
-  }
-  if (!fs::is_directory(resolved.parent_path(), ec)) {
-    throw OutputError("התיקייה של קובץ הפלט " + pXlsFile + " לא נמצאה");
-  }
-  if (::access(resolved.parent_path().c_str(), W_OK | X_OK) != 0) {
-    throw OutputError("אין הרשאה לכתוב בתיקייה של קובץ הפלט " + pXlsFile);
-  }
+namespace output_internal {
+
+bool OfficeConverterInstalled() {
+  return !FindOffice().empty();
 }
 
+}  // namespace output_internal
+
 void ConvertToExcel(const std::string& pCsvFile, const std::string& pXlsFile, bool pOpenExcel,
-                    UserSeam& ui, const std::string& companyPath,
+                    UserSeam& ui, const std::vector<std::string>& companyFolders,
                     const std::vector<Finding>& findings, bool showFindings) {
-  CheckWorkbookTarget(pXlsFile, companyPath);
+  CheckOutputTarget(pXlsFile, TargetKind::kWorkbook, companyFolders);
   { const CsvLineReader readable(pCsvFile); }  // a missing file is reported before writing
   const fs::path target = PathFromUtf8(pXlsFile);
   // Written beside the file a link points to, so the link keeps pointing at the workbook.
-  PendingFile pending(Resolved(target));
-  if (Lower(target.extension().string()) == ".xlsx") {
-    WriteXlsx(pCsvFile, pending.path().string(), pOpenExcel, findings, showFindings);
+  ReplacingFile pending(ResolvedPath(target));
+  if (LowerAscii(target.extension().string()) == ".xlsx") {
+    WriteXlsx(pCsvFile, pending.writePath(), pOpenExcel, findings, showFindings);
   } else {
-    ConvertWithOffice(pCsvFile, target, pending.path(), pOpenExcel, findings, showFindings);
+    ConvertWithOffice(pCsvFile, target, pending.writePath(), pOpenExcel, findings, showFindings);
   }
   pending.Commit();
   if (pOpenExcel && !ui.OpenInSpreadsheet(pXlsFile)) {

@@ -36,7 +36,7 @@ class QtSettingsStore : public SettingsStore {
             std::string_view value) override;
 
   // The file or registry path the values live in (UTF-8).
-  std::string Location() const;
+  std::string Location() const override;
 
  private:
   std::unique_ptr<QSettings> settings_;

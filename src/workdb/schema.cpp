@@ -31,6 +31,18 @@ void RemoveOldFile(const std::filesystem::path& path) {
   }
 }
 
+// A database file being created: removed again unless its creation was done, so that a
+// failed creation (a full disk) leaves no half-made file behind.
+struct RemovedUnlessDone {
+  std::filesystem::path path;
+  bool done = false;
+  ~RemovedUnlessDone() {
+    if (done) return;
+    std::error_code ec;
+    std::filesystem::remove(path, ec);
+  }
+};
+
 // The full path of a database file in the temporary folder, after checking that the folder
 // is there to write into.
 std::filesystem::path PathInTemp(const char* fileName) {
@@ -177,6 +189,7 @@ std::string CreateWorkDB(const std::string& selectDbPath, UserSeam& ui) {
   return CreateOrReport(ui, [&]() -> std::string {
     const std::filesystem::path path = PathInTemp(kWorkDbName);
     RemoveOldFile(path);
+    RemovedUnlessDone partial{path};
     db::Database work = db::Database::Create(path, kHebrewLocale, db::Durability::Scratch);
     for (const TableDef& table : WorkDbTables()) work.CreateTable(table);
     if (!selectDbPath.empty()) {
@@ -188,6 +201,7 @@ std::string CreateWorkDB(const std::string& selectDbPath, UserSeam& ui) {
     }
     work.CreateQuery("qHeadByItem", HeadByItemSql());
     work.Close();
+    partial.done = true;
     return path.string();
   });
 }
@@ -196,9 +210,11 @@ std::string CreateSelectDB(UserSeam& ui) {
   return CreateOrReport(ui, [&]() -> std::string {
     const std::filesystem::path path = PathInTemp(kSelectDbName);
     RemoveOldFile(path);
+    RemovedUnlessDone partial{path};
     db::Database select = db::Database::Create(path, kHebrewLocale, db::Durability::Durable);
     select.CreateTable(SelectAccountTable());
     select.Close();
+    partial.done = true;
     return path.string();
   });
 }

@@ -157,7 +157,9 @@ const CliRun kRuns[] = {
      "={T}/zdrlab1.htm\n",
      "מאתחל בסיס נתונים|קורא רשימת כרטיסים|קריאת הנתונים הסתיימה|מכין רשימה|הכנת הרשימה הסתיימה",
      "zdrlab1.htm ^<HTML>"},
-    {"WorkingDatabaseWasReadableByEveryone", "@labels", 0, "", "", "zdrlab.DB #600"},
+    // The pages and the dispatch file hold the same names as the working database.
+    {"OutputsWereReadableByEveryone", "@labels;@list;@post --set FilePath={T}/p.xlsx", 0, "", "",
+     "zdrlab.DB #600|zdrlab1.htm #600;zdrlab2.htm #600;zdpost1.csv #600"},
     {"PostWithoutOutputFileIsRefused", "@post", 1, "=", "לא הוגדר קובץ פלט|!מאתחל בסיס נתונים"},
     {"PostWritesTheWorkbook", "@post --set FilePath={T}/post.xlsx --set Weight=0.5", 0,
      "={T}/post.xlsx\n", "הכנת הקובץ הסתיימה. שגיאות: ",
@@ -171,12 +173,14 @@ const CliRun kRuns[] = {
      3, nullptr, ";הקובץ לא נכתב. שגיאות: ", "zdpost1.csv -|post.xlsx -"},
     {"MissingCompanyFolderReportsTheAccountFault", "labels --company {T}/none --settings {S}", 1,
      "", "תקלה בקריאת החשבונות"},
+    // Said in Hebrew; an option word where a file name belongs is not taken as the name.
     {"WrongUsage",
      "--bogus;print;labels --company;labels --bogus;labels --open=yes;@labels --check;"
-     "@labels --set NoSuchKey=1",
-     2, "", ";;;;;;NoSuchKey"},
-    {"SetValueTheControlRefusesStopsBeforeTheCommand", "@labels --set SortBy=12", 2, "", "",
-     "zdrlab1.htm -"},
+     "@labels --set NoSuchKey=1;calibrate --pdf --template;labels --company --settings {S}",
+     2, "",
+     "אפשרות לא מוכרת: --bogus;פקודה לא מוכרת: print;חסר ערך;אפשרות לא מוכרת;אינה מקבלת ערך;"
+     "אינה שייכת לפקודה;הגדרה לא מוכרת: NoSuchKey;--template\" הוא אפשרות;--settings\" הוא אפשרות",
+     "--template -"},
     {"RunWaitingOnAHeldTempFolderTouchedTheOtherRunsFiles", "@labels", 1, "",
      "תפוסים בידי הפעלה אחרת של התוכנה|!מאתחל בסיס נתונים",
      "zdrlab.DB =the other run's database|zdrlab1.htm -", "", "held"},
@@ -206,32 +210,23 @@ const CliRun kRuns[] = {
      "calibrate --settings {S} --pdf {T}/c.pdf --template Avery{_}L6015;"
      "calibrate --settings {S} --pdf {T}/c.pdf --scale 100.5,0",
      2, "", "מדבקות תקליטור;--scale", "c.pdf -"},
-    {"SettingsThatAskForThePdfGiveIt", "@labels", 0, "={T}/zdrlab1.pdf\n", "", "zdrlab1.pdf ^%PDF-",
-     "", "pdfsettings"},
+    {"SettingsThatAskForThePdfGiveIt", "@labels", 0, "={T}/zdrlab1.pdf\n", "",
+     "zdrlab1.pdf ^%PDF-|zdrlab1.pdf #600", "", "pdfsettings"},
+    // A user stock ("mine", its PageHeight missing) that fails its check says why.
     {"PdfOptionsAreChecked",
      "calibrate --settings {S};labels --template a4-2x4-105x74 --settings {S};"
      "labels --pdf {T}/x.pdf --offset 10.5,0 --settings {S};"
      "labels --pdf {T}/x.pdf --offset 0.05,0 --settings {S};"
-     "labels --pdf {T}/x.pdf --template none --settings {S};list --pdf {T}/x.pdf --settings {S}",
-     2, "", "", "x.pdf -"},
+     "labels --pdf {T}/x.pdf --template none --settings {S};list --pdf {T}/x.pdf --settings {S};"
+     "labels --pdf {T}/x.pdf --template mine --settings {S}",
+     2, "",
+     "צריכה --pdf;באים עם --pdf;--offset מקבל;--offset מקבל;\"none\" אינה מוכרת;אינה שייכת;"
+     "\"mine\" שבהגדרות אינה תקינה: הערך PageHeight",
+     "x.pdf -", "", "badstock"},
     {"LinkPlantedInTempRedirectedTheOutput", "@list;@post --set FilePath={T}/p.xlsx", 0,
      "={T}/zdrlab2.htm\n;={T}/p.xlsx\n", "",
      "victim =not yours|zdrlab.DB #|zdrlab2.htm #;victim =not yours|zdrlab.DB #|zdpost1.csv #", "",
      "links"},
-    // A bad dispatch target is refused before anything is loaded; nothing at it or in the
-    // company folder changes.
-    {"PostDeletedTheTargetBeforeCheckingIt",
-     "@post --set FilePath={T}/company/ACT.fix;@post --set FilePath={T}/company/out.xlsx;"
-     "@post --set FilePath={T}/link.xlsx;@post --set FilePath={T}/amv.fix;"
-     "@post --set FilePath={T}/folder;@post --set FilePath={T}/old.xls;"
-     "@post --set FilePath={T}/notes.txt;@post --set FilePath={T}/book;"
-     "@post --set FilePath={T}/none/book.xlsx",
-     1, "",
-     "נמצא בתיקיית החברה|!מאתחל;נמצא בתיקיית החברה|!מאתחל;נמצא בתיקיית החברה|!מאתחל;"
-     "קובץ הנהלת חשבונות|!מאתחל;הוא תיקייה|!מאתחל;לא נמצאה תוכנה שממירה|!מאתחל;"
-     "לא ניתן לכתוב גיליון עבודה|!מאתחל;אין סיומת|!מאתחל;לא נמצאה|!מאתחל",
-     ";;;amv.fix -;;old.xls =old workbook;notes.txt =old notes;book -;", "PATH={T}/none",
-     "targets"},
 };
 
 // A company folder's file names and their bytes.
@@ -243,7 +238,7 @@ std::vector<std::pair<fs::path, std::string>> Snapshot(const fs::path& folder) {
   return files;
 }
 
-std::shared_ptr<void> Prepare(const std::string& what, const fs::path& t, const fs::path& company) {
+std::shared_ptr<void> Prepare(const std::string& what, const fs::path& t) {
   if (what == "held") {
     std::ofstream(t / "zdrlab.DB") << "the other run's database";
     return std::make_shared<zdr::WorkFilesLock>(t);
@@ -253,7 +248,7 @@ std::shared_ptr<void> Prepare(const std::string& what, const fs::path& t, const 
     fs::create_directories(t / "fifo");
     EXPECT_EQ(::mkfifo((t / "fifo" / "ACT.fix").c_str(), 0600), 0);
   }
-  if (what == "unreadable" || what == "targets") fs::create_directories(t / "folder");
+  if (what == "unreadable") fs::create_directories(t / "folder");
   if (what == "unreadable") {
     std::ofstream(t / "locked.ini") << "[Params]\n";
     fs::permissions(t / "locked.ini", fs::perms::none);
@@ -268,13 +263,21 @@ std::shared_ptr<void> Prepare(const std::string& what, const fs::path& t, const 
     for (const char* name : {"zdrlab.DB", "zdrlab2.htm", "zdpost1.csv"})
       fs::create_symlink(t / "victim", t / name);
   }
-  if (what == "targets") {
-    fs::copy(company, t / "company");
-    std::ofstream(t / "old.xls") << "old workbook";
-    std::ofstream(t / "notes.txt") << "old notes";
-    fs::create_symlink(t / "company" / "ACT.fix", t / "link.xlsx");
+  if (what == "badstock") {
+    std::ofstream(t / "settings.ini") << "[ZDRLab]\nLabelStocks\\Ids=mine\n"
+                                      << "LabelStock.mine\\PageWidth=210\n";
   }
   return nullptr;
+}
+
+// Temporary files of a writer left in `folder` (".out.xlsx.XXXXXX", "out.pdf.XXXXXX").
+std::vector<std::string> TemporaryFilesIn(const fs::path& folder) {
+  std::vector<std::string> left;
+  for (const auto& e : fs::directory_iterator(folder)) {
+    const std::string name = e.path().filename().string();
+    if (name.find(".xlsx.") != name.npos || name.find(".pdf.") != name.npos) left.push_back(name);
+  }
+  return left;
 }
 
 TEST_F(CliTest, EveryRunGivesItsExitCodeOutputAndFiles) {
@@ -286,9 +289,7 @@ TEST_F(CliTest, EveryRunGivesItsExitCodeOutputAndFiles) {
       SCOPED_TRACE(std::string(c.name) + ": " + args);
       NewTemp("run" + std::to_string(++n));
       if (args.find("locked") != args.npos && ::geteuid() == 0) continue;  // root reads it
-      const bool targets = std::string(c.setup) == "targets";
-      const std::shared_ptr<void> held = Prepare(c.setup, temp_, Company());
-      company_ = targets ? temp_ / "company" : Company();
+      const std::shared_ptr<void> held = Prepare(c.setup, temp_);
       const RunResult r = Run(args, Part(c.env, part));
       EXPECT_EQ(r.exitCode, c.exit) << r.err;
       for (const auto& pattern : Split(out, '|'))
@@ -314,21 +315,185 @@ TEST_F(CliTest, EveryRunGivesItsExitCodeOutputAndFiles) {
           EXPECT_TRUE(Matches(Contents(p), pattern)) << p << ": " << pattern;
         }
       }
-      if (targets) {
-        EXPECT_TRUE(Snapshot(temp_ / "company") == Snapshot(Company())) << "the company changed";
-        EXPECT_TRUE(fs::is_directory(temp_ / "folder") && fs::is_symlink(temp_ / "link.xlsx"));
-      }
-      for (const auto& e : fs::directory_iterator(temp_)) {
-        const std::string name = e.path().filename().string();
-        EXPECT_TRUE(name.find(".xlsx.") == std::string::npos && name.find(".pdf.") == name.npos)
-            << "temporary file left: " << name;
+      EXPECT_EQ(TemporaryFilesIn(temp_), std::vector<std::string>{}) << "temporary file left";
+    }
+}
+
+// ---- One target check for every file the user names -------------------------------------
+
+// The writers of a file at a path the user gives: {TARGET} is the path, with "X" in it the
+// writer's extension.
+struct Writer {
+  const char *name, *args, *ext, *magic;
+};
+const Writer kWriters[] = {
+    {"workbook", "@post --set FilePath={TARGET}", "xlsx", "PK"},
+    {"label PDF", "@labels --pdf {TARGET}", "pdf", "%PDF-"},
+    {"calibration PDF", "calibrate --company {C} --settings {S} --pdf {TARGET}", "pdf", "%PDF-"},
+};
+
+struct TargetCase {
+  const char* name;
+  const char* target;  // {C} the company, {T} the temporary folder
+  int exit[std::size(kWriters)];
+  const char* message;  // a pattern for all writers, or one per writer split at ';'
+  const char* env = "";
+};
+
+// Regression: `labels --pdf C/ACT.fix` and `calibrate --pdf amv.fix` (run in the company
+// folder) replaced the host's files with a PDF, and `calibrate --pdf --template` wrote a file
+// named "--template"; only the workbook was checked. The settings keep the company {T}/kept.
+const TargetCase kTargets[] = {
+    {"HostFileInTheCompany", "{C}/ACT.fix", {1, 1, 1}, "נמצא בתיקיית החברה"},
+    {"OtherFileInTheCompany", "{C}/out.X", {1, 1, 1}, "נמצא בתיקיית החברה"},
+    {"LinkIntoTheCompany", "{T}/link.X", {1, 1, 1}, "נמצא בתיקיית החברה"},
+    {"HostNameRunInTheCompany", "amv.fix", {1, 1, 1}, "נמצא בתיקיית החברה", "cd {C} &&"},
+    {"CompanyTheSettingsKeep", "{T}/kept/out.X", {1, 1, 1}, "נמצא בתיקיית החברה"},
+    {"HostNameElsewhere", "{T}/amv.fix", {1, 1, 1}, "בשם של קובץ הנהלת חשבונות"},
+    {"BatchNameElsewhere", "{T}/A12.TMP", {1, 1, 1}, "בשם של קובץ הנהלת חשבונות"},
+    {"Folder", "{T}/folder", {1, 1, 1}, "הוא תיקייה"},
+    {"OtherExtension",
+     "{T}/notes.txt",
+     {1, 1, 1},
+     "לא ניתן לכתוב גיליון עבודה;לא ניתן לכתוב קובץ PDF;לא ניתן לכתוב קובץ PDF"},
+    {"NoExtension", "{T}/book", {1, 1, 1}, "אין סיומת"},
+    {"NoSuchFolder", "{T}/none/out.X", {1, 1, 1}, "לא נמצאה"},
+    {"Fifo", "{T}/fifo.X", {1, 1, 1}, "אינו קובץ רגיל"},
+    {"OptionWord", "--template", {1, 2, 2}, "אין סיומת;\"--template\" הוא אפשרות;הוא אפשרות"},
+    {"Written", "{T}/out.X", {0, 0, 0}, "!שגיאה"},
+};
+
+TEST_F(CliTest, EveryWriterRefusesTheSameTargets) {
+  for (const TargetCase& c : kTargets) {
+    for (size_t w = 0; w < std::size(kWriters); ++w) {
+      const Writer& writer = kWriters[w];
+      SCOPED_TRACE(std::string(c.name) + " by the " + writer.name);
+      NewTemp(std::string(c.name) + "_" + writer.ext + std::to_string(w));
+      company_ = temp_ / "company";
+      fs::copy(Company(), company_);
+      fs::create_directories(temp_ / "folder");
+      fs::create_directories(temp_ / "kept");
+      std::ofstream(settings_) << "[ZDRLab]\nParams\\ConnDataBase=" << (temp_ / "kept").string()
+                               << "\n";
+      std::ofstream(temp_ / "notes.txt") << "old notes";
+      ASSERT_EQ(::mkfifo((temp_ / ("fifo." + std::string(writer.ext))).c_str(), 0600), 0);
+      fs::create_symlink(company_ / "ACT.fix", temp_ / ("link." + std::string(writer.ext)));
+      // What a killed run writing out.X left: gone after the next run for out.X.
+      const std::string out = "out." + std::string(writer.ext);
+      std::ofstream(temp_ / ("." + out + ".Ab12Cd")) << writer.magic << "customer names";
+
+      std::string target = Expand(c.target);
+      if (const size_t x = target.rfind(".X"); x != std::string::npos && x + 2 == target.size())
+        target.replace(x + 1, 1, writer.ext);
+      std::string args = writer.args;
+      args.replace(args.find("{TARGET}"), 8, target);
+      const RunResult r = Run(args, c.env);
+
+      EXPECT_EQ(r.exitCode, c.exit[w]) << r.err;
+      EXPECT_TRUE(Matches(r.err, Part(c.message, w))) << Part(c.message, w) << "\n" << r.err;
+      EXPECT_TRUE(Snapshot(company_) == Snapshot(Company())) << "the company changed";
+      EXPECT_EQ(ReadBytes(temp_ / "notes.txt"), "old notes");
+      EXPECT_FALSE(fs::exists(temp_ / "--template"));
+      if (c.exit[w] == 0) {
+        EXPECT_TRUE(ReadBytes(temp_ / out).starts_with(writer.magic));
+        EXPECT_EQ(TemporaryFilesIn(temp_), std::vector<std::string>{});
+      } else if (c.exit[w] == 1) {
+        EXPECT_FALSE(Matches(r.err, "מאתחל בסיס נתונים")) << "refused before any work";
       }
     }
+  }
+}
+
+// ---- One table of values for --set and the settings file --------------------------------
+
+// Regression: a settings file with one value its control refuses (UseCatCode=7, SortBy=99)
+// silently dropped every key after it, the criteria included: the run chose 197 recipients
+// instead of 10. A weight of "abc" went into every row of the dispatch file. Such a value is
+// wrong usage, by --set or in a settings file, and nothing is written.
+TEST_F(CliTest, RefusedValueIsWrongUsageByEveryWayIn) {
+  const std::tuple<const char*, const char*, const char*> kBadValues[] = {
+      {"Params", "UseCatCode", "7"},  {"Params", "SortBy", "99"},    {"Params", "DocType", "x"},
+      {"PostIL", "Weight", "abc"},    {"PostIL", "Weight", "-1"},    {"PostIL", "Weight", "0,5"},
+      {"PostIL", "OpenExcel", "yes"}, {"PostIL", "FileFormat", "2"}, {"", "ChkByItems", "3"},
+  };
+  for (const auto& [section, key, value] : kBadValues) {
+    for (const bool inFile : {false, true}) {
+      if (inFile && *section == '\0') continue;  // not a stored value
+      SCOPED_TRACE(std::string(key) + "=" + value +
+                   (inFile ? " in the settings file" : " by --set"));
+      NewTemp(std::string(key) + value + (inFile ? "file" : "set"));
+      if (inFile) {
+        std::ofstream(settings_) << "[ZDRLab]\n" << section << "\\" << key << "=" << value << "\n";
+      }
+      const std::string set = inFile ? "" : std::string(" --set ") + key + "=" + value;
+      const RunResult r = Run("@post --set FilePath={T}/p.xlsx" + set);
+      EXPECT_EQ(r.exitCode, 2) << r.err;
+      const std::string said = std::string(key) + " אינו תקין";
+      EXPECT_TRUE(Matches(r.err, "\"" + std::string(value) + "\" של ההגדרה " + said)) << r.err;
+      if (inFile) {
+        EXPECT_TRUE(Matches(r.err, settings_.string())) << r.err;
+      }
+      for (const char* file : {"p.xlsx", "zdpost1.csv", "zdrlab.DB"})
+        EXPECT_FALSE(fs::exists(temp_ / file)) << file;
+    }
+  }
+}
+
+// ---- A full temporary folder ---------------------------------------------------------------
+
+// Regression: a full temporary folder gave SQLite's English cause, then two misleading
+// "database file not found" messages, and left 0-byte pages. Now one Hebrew message names the
+// folder and the full disk, and no page is left. The folder is a small file system mounted
+// for the run alone (a user and mount namespace); without them the test is skipped.
+TEST_F(CliTest, FullTempFolderIsOneMessage) {
+  const fs::path full = temp_ / "full";
+  fs::create_directories(full);
+  const std::string probe = "unshare -rm sh -c " +
+                            Quote("mount -t tmpfs tmpfs " + Quote(full.string())) +
+                            " >/dev/null 2>&1";
+  if (std::system(probe.c_str()) != 0) GTEST_SKIP() << "no mount namespace for a small tmpfs";
+  // Runs the label sheet with a file system of `kb` KB as the temporary folder; the exit code,
+  // standard error, and the files left ("name bytes" lines).
+  const auto runIn = [&](int kb) {
+    const std::string run =
+        "mount -t tmpfs -o size=" + std::to_string(kb) + "k tmpfs " + Quote(full.string()) +
+        " && Temp=" + Quote(full.string()) + " " +
+        Quote(std::string(ZDR_BINARY_DIR) + "/src/zdrlab") + " labels --company " +
+        Quote(Company().string()) + " --settings " + Quote(settings_.string()) +
+        " --set UseTitle1=1 --set UseTitle4=1 --set UseTransType=1 --set TransType=*"
+        " --set ReadTempTrans=1 2>" +
+        Quote((temp_ / "err").string()) + "; echo $? >" + Quote((temp_ / "rc").string()) + "; cd " +
+        Quote(full.string()) + " && for f in *; do echo \"$f $(stat -c %s \"$f\")\"; done >" +
+        Quote((temp_ / "left").string());
+    EXPECT_EQ(std::system(("unshare -rm sh -c " + Quote(run)).c_str()), 0);
+    return std::tuple(ReadBytes(temp_ / "rc"), ReadBytes(temp_ / "err"), ReadBytes(temp_ / "left"));
+  };
+  // With room, to learn the database's size.
+  const auto [rc, err, left] = runIn(4096);
+  ASSERT_EQ(rc, "0\n") << err;
+  const size_t at = left.find("zdrlab.DB ");
+  ASSERT_NE(at, std::string::npos) << left;
+  const int dbKb = (std::stoi(left.substr(at + 10)) + 4095) / 4096 * 4;
+  // No room for the database; room for the database but not the page.
+  for (const auto& [kb, file] : {std::pair(16, "zdrlab.DB"), std::pair(dbKb + 4, "zdrlab1.htm")}) {
+    SCOPED_TRACE(std::to_string(kb) + " KB");
+    const auto [rc, err, left] = runIn(kb);
+    EXPECT_EQ(rc, "1\n") << err;
+    size_t messages = 0;
+    for (const auto& line : Split(err, '\n'))
+      messages += line.starts_with("[!") || line.starts_with("[i]");
+    EXPECT_EQ(messages, 1u) << err;
+    EXPECT_TRUE(Matches(err, "אין מקום פנוי בדיסק: התיקייה " + full.string() +
+                                 " מלאה, ולא ניתן לכתוב בה את הקובץ " + file))
+        << err;
+    EXPECT_TRUE(Matches(left, "!zdrlab1.htm")) << left;
+    EXPECT_TRUE(Matches(left, "!zdrlab.DB 0")) << left;
+  }
 }
 
 TEST_F(CliTest, NoCommandWithoutADisplayAborted) {
   const RunResult r = Run({}, "env -u DISPLAY -u WAYLAND_DISPLAY -u QT_QPA_PLATFORM");
-  if (r.exitCode == 2 && r.err.find("without its window") != std::string::npos) {
+  if (r.exitCode == 2 && r.err.find("נבנה בלי החלון") != std::string::npos) {
     GTEST_SKIP() << "built without the window";
   }
   EXPECT_EQ(r.exitCode, 1) << r.err;

@@ -294,14 +294,15 @@ TEST(StockCatalogueTest, TemplatesBecomeStocksOrSayWhyNot) {
 TEST(StockCatalogueTest, InstalledPartsAreFoundByBrandAndPart) {
   MemorySettingsStore store;
   const auto l7160 = FindLabelStock(store, "Avery L7160");
-  ASSERT_TRUE(l7160) << LabelStockLookupProblem(store, "Avery L7160");
+  ASSERT_TRUE(l7160) << LabelStockChoiceProblem(store, "Avery L7160");
   EXPECT_EQ(std::pair(l7160->cols, l7160->rows), std::pair(3, 7));
   EXPECT_FALSE(FindLabelStock(store, "Avery L6015"));
-  EXPECT_EQ(LabelStockLookupProblem(store, "Avery L6015"),
+  EXPECT_EQ(LabelStockChoiceProblem(store, "Avery L6015"),
             "את תבנית המדבקות \"Avery L6015\" לא ניתן להדפיס: מדבקות תקליטור; ניתן להדפיס רק "
             "מדבקות מלבניות");
-  EXPECT_EQ(LabelStockLookupProblem(store, "Avery L0000"),
-            "תבנית המדבקות \"Avery L0000\" אינה מוכרת");
+  EXPECT_TRUE(LabelStockChoiceProblem(store, "Avery L0000")
+                  .starts_with("תבנית המדבקות \"Avery L0000\" אינה מוכרת. התבניות המוכרות: "
+                               "a4-3x8-70x37, "));
   const auto& entries = InstalledStockCatalogue().entries;
   EXPECT_GT(std::count_if(entries.begin(), entries.end(), [](const auto& e) { return e.stock; }),
             1000);

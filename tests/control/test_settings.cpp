@@ -209,12 +209,16 @@ TEST(PostILDefsTest, FreshStoreRoundTripAndUnreadableValues) {
   SetGetRegPostILDefs(kActionLoad, store, postIL);
   EXPECT_EQ(Fields(postIL), Fields(saved));
 
-  for (const auto& [key, value] : Pairs("OpenExcel=40000 FileFormat=דואר"))
+  // A refused value keeps the old one, and the load says which.
+  for (const auto& [key, value] : Pairs("OpenExcel=40000 FileFormat=דואר Weight=abc"))
     store.Save("ZDRLab", "PostIL", key, value);
   postIL.FileFormat = 0;
-  SetGetRegPostILDefs(kActionLoad, store, postIL);
-  EXPECT_EQ(postIL.OpenExcel, 1);
-  EXPECT_EQ(postIL.FileFormat, 0);
+  std::vector<std::string> refused;
+  for (const SettingsValueError& e : SetGetRegPostILDefs(kActionLoad, store, postIL))
+    refused.push_back(e.section() + "/" + e.key() + "=" + e.value());
+  EXPECT_EQ(refused, (std::vector<std::string>{"PostIL/Weight=abc", "PostIL/OpenExcel=40000",
+                                               "PostIL/FileFormat=דואר"}));
+  EXPECT_EQ(Fields(postIL), Fields(PostILSettings{"שליח", "0.5", " 1 ", "/tmp/דואר.xlsx", 1, 0}));
 
   // A failed save of one key does not stop the others.
   FailingStore failing("Weight");
@@ -315,8 +319,8 @@ TEST(UserStockTest, SavedStocksComeBackAndAnOwnOffsetWinsOverTheUsers) {
   store.Save(kSettingsApp, "LabelStock.wide", "Rows", "many");
   EXPECT_TRUE(LoadUserStocks(store).empty());
   EXPECT_FALSE(FindLabelStock(store, "wide"));
-  EXPECT_EQ(LabelStockLookupProblem(store, "wide"),
-            "את תבנית המדבקות \"wide\" לא ניתן להדפיס: הערכים השמורים שלה חסרים או אינם תקינים");
+  EXPECT_EQ(LabelStockChoiceProblem(store, "wide"),
+            "תבנית המדבקות \"wide\" שבהגדרות אינה תקינה: הערך Rows של התבנית חסר או אינו מספר");
 }
 
 }  // namespace

@@ -447,33 +447,73 @@ TEST_F(GuiTest, SizeOf300ClosedTheLabelDialogAndDroppedLaterRows) {
   // clang-format on
 }
 
-TEST_F(GuiTest, DispatchDialogLoadsConfirmsAndCancels) {
-  store_.Save(kSettingsApp, kPostILSection, "Weight", "0.5");
+// Regression: the dispatch dialog took "abc" as the weight, and a stored value the panel
+// refused stopped its load with nothing shown, so the criteria after it looked chosen. The
+// dialog names the box and keeps what was typed; the start-up names the key and the value.
+TEST_F(GuiTest, RefusedValuesAreToldAndNothingTypedIsLost) {
   WhenShown<frmPostIL>([&](frmPostIL& d) {
-    EXPECT_EQ(d.txtWeight->text(), "0.5");
-    d.txtService->setText(Q("רגיל"));
-    QTest::mouseClick(d.ChkOpenExcel, Qt::LeftButton);
-    desk_.answer = "/out/new.xlsx";
-    Press(d, "CmdDir");
+    d.txtService->setText(Q("רשום"));
+    for (const char* bad : {"abc", "-1", "0", "0,5", " 2"}) {
+      d.txtWeight->setText(Q(bad));
+      Press(d, "cmdOK");
+      EXPECT_TRUE(d.isVisible()) << bad;
+      EXPECT_NE(desk_.shown.back().first.find(std::string("בתיבה \"משקל\" הוקלד \"") + bad),
+                std::string::npos)
+          << desk_.shown.back().first;
+      EXPECT_EQ(d.focusWidget(), d.txtWeight);
+      EXPECT_EQ(FromQ(d.txtWeight->text()) + FromQ(d.txtService->text()),
+                bad + std::string("רשום"));
+    }
+    EXPECT_TRUE(store_.Values().empty()) << "nothing saved";
+    d.txtWeight->setText(Q("0.75"));
     Press(d, "cmdOK");
   });
   Press(*card_, "cmdPostDef");
-  for (auto [key, value] : {std::pair{"Service", "רגיל"},
-                            {"OpenExcel", "1"},
-                            {"Weight", "0.5"},
-                            {"FilePath", "/out/new.xlsx"}})
-    EXPECT_EQ(Stored(kPostILSection, key), value) << key;
-  WhenShown<frmPostIL>([&](frmPostIL& d) {
-    d.txtService->setText(Q("אחר"));
-    Press(d, "cmdCancel");
-  });
-  Press(*card_, "cmdPostDef");
-  EXPECT_EQ(Stored(kPostILSection, "Service"), "רגיל");
+  EXPECT_EQ(Stored(kPostILSection, "Weight"), "0.75");
+
+  const std::tuple<const char*, const char*, const char*, bool> stored[] = {
+      {"Params", "UseCatCode", "7", true},
+      {"Params", "SortBy", "99", true},
+      {"PostIL", "Weight", "abc", false},
+      {"PostIL", "FileFormat", "2", false}};
+  for (const auto& [section, key, value, stopsThePanel] : stored) {
+    SCOPED_TRACE(key);
+    store_ = MemorySettingsStore();
+    store_.Save(kSettingsApp, section, key, value);
+    store_.Save(kSettingsApp, kParamsSection, "UseLogo1", "1");  // after both Params keys
+    desk_.shown.clear();
+    card_ = MakeCard();
+    ASSERT_EQ(desk_.shown.size(), 1u);
+    const std::string& text = desk_.shown[0].first;
+    EXPECT_NE(text.find(std::string("\"") + value + "\" של ההגדרה " + key), std::string::npos)
+        << text;
+    EXPECT_EQ(desk_.shown[0].second, "שגיאה");
+    EXPECT_EQ(card_->control().panel().ChkLogo[1], stopsThePanel ? 0 : 1);
+    EXPECT_EQ(card_->control().postILSettings().Weight, "");
+  }
 }
 
 TEST_F(GuiTest, StockChoicesAreKeptAndAStocksOwnOffsetStaysWithIt) {
   LabelStockBox& box = *card_->labDefDialog()->StockBox;
+  // Regression: a stock of the user's that fails its check vanished from the list unexplained.
+  store_.Save(kSettingsApp, kLabelStocksSection, "Ids", "narrow");
+  for (auto [key, value] : {std::pair{"PageWidth", "210"},
+                            {"PageHeight", "297"},
+                            {"Top", "0"},
+                            {"Side", "0"},
+                            {"LabelWidth", "80"},
+                            {"LabelHeight", "30"},
+                            {"PitchX", "70"},
+                            {"PitchY", "30"},
+                            {"Padding", "1"},
+                            {"Rows", "2"},
+                            {"Cols", "2"}})
+    store_.Save(kSettingsApp, "LabelStock.narrow", key, value);
   box.Load();
+  ASSERT_FALSE(desk_.shown.empty());
+  EXPECT_NE(desk_.shown.back().first.find("\"narrow\" אינה מוצגת ברשימה"), std::string::npos)
+      << desk_.shown.back().first;
+  EXPECT_EQ(box.cmbStock->findData(QStringLiteral("narrow")), -1);
   box.cmbStock->setCurrentIndex(box.cmbStock->findData(QStringLiteral("a4-2x4-105x74")));
   box.txtOffsetX->setValue(1.3);
   box.cmbOutput->setCurrentIndex(1);

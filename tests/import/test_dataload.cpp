@@ -2,6 +2,7 @@
 // which status messages, and what ends it.
 
 #include <gtest/gtest.h>
+#include <sys/stat.h>
 
 #include <algorithm>
 #include <fstream>
@@ -15,6 +16,7 @@
 #include "common/panel.h"
 #include "control/control.h"
 #include "control/dataload.h"
+#include "control/settings.h"
 #include "hostfile/doctypes.h"
 #include "hosttext/codepage.h"
 #include "output/output.h"
@@ -57,7 +59,7 @@ class DataLoad : public test::ImportTest {
     Write("a7.tmp", {zdrgen::BatchRecord({"A", {"43", "", "", ""}, day, day})});
   }
 
-  void Load(bool asIs = true) { ReadAllData(asIs, panel_, state_, docTypes_, seam_); }
+  LoadResult Load(bool asIs = true) { return ReadAllData(asIs, panel_, state_, docTypes_, seam_); }
   Strings Query(const std::string& sql) { return Rows(state_.workDbPath, sql); }
   Panel panel_;
   ControlState state_;
@@ -109,15 +111,66 @@ TEST_F(DataLoad, BadJournalBoundEndsTheLoadAtTheBatches) {
   EXPECT_EQ(Count(state_.workDbPath, "tAccount"), 2);
 }
 
-TEST_F(DataLoad, FailedDatabaseCreationStoresEmptyPathAndGoesOn) {
+// Regression: a database that could not be created (a full temporary folder) was followed by
+// every importer's "database file not found", which hid the cause.
+TEST_F(DataLoad, FailedDatabaseCreationIsTheOnlyMessage) {
   test::ScopedEnv temp("Temp", (root_ / "missing" / "folder").c_str());
   state_.workDbPath = "old";
-  Load();
+  const LoadResult r = Load();
   EXPECT_EQ(state_.workDbPath, "");
-  EXPECT_EQ(seam_.statuses, (Strings{kInit, kAccounts, kDone}));
-  ASSERT_EQ(seam_.messages.size(), 2u);
+  EXPECT_EQ(std::pair(r.databaseUsable, r.failures), std::pair(false, 1));
+  EXPECT_EQ(seam_.statuses, (Strings{kInit}));
+  ASSERT_EQ(seam_.messages.size(), 1u);
   EXPECT_EQ(seam_.messages[0].title, "תקלה");
-  EXPECT_EQ(seam_.messages[1].title, "תקלה בקריאת החשבונות");
+}
+
+// Regression: a FIFO under a batch's name was passed over in silence. It is reported as any
+// unreadable batch, without waiting on it, and the load goes on with the other batches.
+TEST_F(DataLoad, FifoInPlaceOfABatchIsReported) {
+  ASSERT_EQ(::mkfifo((std::filesystem::path(company_) / "a11.tmp").c_str(), 0600), 0);
+  panel_.ChkJournal = 1;
+  panel_.txtFromJournal = "1";
+  panel_.chkReadTempTrans = 1;
+  const LoadResult r = Load();
+  EXPECT_EQ(std::pair(r.databaseUsable, r.failures), std::pair(true, 1));
+  EXPECT_EQ(seam_.statuses.back(), kDone);
+  ASSERT_EQ(seam_.messages.size(), 1u);
+  EXPECT_NE(seam_.messages[0].text.find("a11.tmp"), std::string::npos);
+  EXPECT_NE(seam_.messages[0].text.find("אינו קובץ רגיל"), std::string::npos);
+  EXPECT_EQ(Count(state_.workDbPath, "tTransact"), 2) << "the ledger row and batch 7's";
+}
+
+// Shows every message under a neutral title and icon, as a message retitled one day would be.
+class NeutralSeam : public test::RecordingSeam {
+ public:
+  void ShowMessage(std::string_view text, std::string_view, MsgIcon) override {
+    RecordingSeam::ShowMessage(text, kTitleMessage, MsgIcon::Information);
+  }
+};
+
+// Regression: whether the load failed was guessed from the title and icon of the message it
+// showed, so a failing importer under a neutral title let a partial load replace the clerk's
+// workbook. The importer's result decides.
+TEST_F(DataLoad, WorkbookIsKeptWhenAnImporterFailsWhateverItsMessageSays) {
+  std::filesystem::remove(std::filesystem::path(company_) / "amv.fix");
+  const std::filesystem::path book = root_ / "book.xlsx";
+  std::ofstream(book) << "last week's workbook";
+  NeutralSeam seam;
+  MemorySettingsStore store;
+  Control control(store, seam);
+  control.Initialize();
+  control.state().companyPath = company_;
+  control.panel().chkTransType = 1;
+  control.panel().txtTransType = "*";
+  control.postILSettings().FilePath = book.string();
+  EXPECT_EQ(control.CmdBuildPostIL(), "");
+  EXPECT_EQ(std::pair(control.lastLoad().databaseUsable, control.lastLoad().failures),
+            std::pair(true, 1));
+  std::ifstream in(book);
+  EXPECT_EQ(std::string(std::istreambuf_iterator<char>(in), {}), "last week's workbook");
+  ASSERT_EQ(seam.messages.size(), 2u);
+  EXPECT_NE(seam.messages[0].text.find("amv.fix"), std::string::npos);
+  EXPECT_NE(seam.messages[1].text.find("לא נכתב מחדש"), std::string::npos);
 }
 
 TEST_F(DataLoad, AsIsReachesTheAccountImportAndCutOffBoxIsWrittenBack) {

@@ -1,10 +1,18 @@
 // The dispatch file, its field cleaning and its workbook copy.
+#include <fcntl.h>
 #include <gtest/gtest.h>
 #include <stdlib.h>
+#include <sys/file.h>
+#include <sys/stat.h>
+#include <unistd.h>
 
 #include <cstdlib>
+#include <filesystem>
+#include <fstream>
+#include <set>
 
 #include "output/outputtest.h"
+#include "output/targetfile.h"
 
 namespace zdr::test {
 namespace {
@@ -116,6 +124,44 @@ TEST_F(DispatchTest, WorkbookFailuresAreReported) {
   Write(NumberedAccounts(1), 0);
   seam.spreadsheetWorks = false;
   EXPECT_THROW(ConvertToExcel(PathOf("zdpost1.csv"), PathOf("o.xlsx"), true, seam), OutputError);
+}
+
+// Regression: a killed run left its temporary workbook or PDF, holding customer names, beside
+// the target for ever. The next run for the target removes what a dead run left and keeps
+// what a live run is writing; a writer that does not finish leaves nothing at all.
+TEST_F(DispatchTest, LeftoversOfAKilledRunAreRemovedAndALiveOnesKept) {
+  const auto plant = [&](const std::string& name, const std::string& bytes, mode_t mode) {
+    std::ofstream(PathOf(name)) << bytes;
+    ::chmod(PathOf(name).c_str(), mode);
+  };
+  const std::pair<const char*, bool> files[] = {
+      {".out.pdf.Ab12Cd", true},     // a dead run's hidden file
+      {"out.pdf.Zz9Yy8", true},      // an earlier version's PDF: private, "%PDF-"
+      {"out.pdf.backup", false},     // the user's copy, readable by others
+      {"out.pdf.Qq1Ww2", false},     // private, but not a PDF
+      {".out.pdf.Live12", false},    // a live run's, held locked
+      {".out.pdf.seven77", false},   // not the shape of a temporary name
+      {".other.pdf.Ab12Cd", false},  // another target's
+  };
+  for (const auto& [name, gone] : files) {
+    const std::string n = name;
+    plant(n, n == "out.pdf.Qq1Ww2" ? "notes" : "%PDF-1.5 names",
+          n == "out.pdf.backup" ? 0644 : 0600);
+  }
+  const int live = ::open(PathOf(".out.pdf.Live12").c_str(), O_RDONLY);
+  ASSERT_EQ(::flock(live, LOCK_EX), 0);
+  const auto listing = [&] {
+    std::set<std::string> names;
+    for (const auto& e : std::filesystem::directory_iterator(dir_))
+      names.insert(e.path().filename().string());
+    return names;
+  };
+  std::set<std::string> expected = listing();
+  for (const auto& [name, gone] : files)
+    if (gone) expected.erase(name);
+  { ReplacingFile unfinished(PathOf("out.pdf")); }
+  EXPECT_EQ(listing(), expected);
+  ::close(live);
 }
 
 }  // namespace

@@ -107,14 +107,34 @@ TEST_F(PreflightTest, CourierLayoutCutsNothingButChecksTheKey) {
 }
 
 // Which telephones, zips and characters a row may hold.
+// Regression for the telephones: 1-700 and 1-800 numbers and the +972 forms, valid business
+// numbers, were errors, and with --strict one such customer stopped the dispatch file.
 TEST_F(PreflightTest, TelephonesZipsAndCharacters) {
   const auto kTel = &AccountRow::telephone, kZip = &AccountRow::zip, kName = &AccountRow::name;
-  const std::tuple<Text AccountRow::*, Text, bool> cases[] = {
-      {kTel, "052-1234567", false}, {kTel, "052 123 4567", false}, {kTel, "0521234567", false},
-      {kTel, std::nullopt, false},  {kTel, "4-8500000", true},     {kTel, "+972-52-1234567", true},
-      {kTel, "0-52-123-45", true},  {kTel, "אין", true},           {kZip, "1234567", false},
-      {kZip, "123456", true},       {kZip, "3100", true},          {kName, "א €₪\"'", false},
-      {kName, "é", true},           {kName, "\xC3\x99", true},     {kName, "א\x7F", true}};
+  const std::tuple<Text AccountRow::*, Text, bool> cases[] = {{kTel, "052-1234567", false},
+                                                              {kTel, "052 123 4567", false},
+                                                              {kTel, "0521234567", false},
+                                                              {kTel, std::nullopt, false},
+                                                              {kTel, "4-8500000", true},
+                                                              {kTel, "+972-52-1234567", false},
+                                                              {kTel, "+97231234567", false},
+                                                              {kTel, "1-800-123456", false},
+                                                              {kTel, "1700-500-500", false},
+                                                              {kTel, "1-900-123456", true},
+                                                              {kTel, "+1-800-123456", true},
+                                                              {kTel, "+972-052-1234567", true},
+                                                              {kTel, "972-52-1234567", true},
+                                                              {kTel, "05+2-1234567", true},
+                                                              {kTel, "1-800-12345", true},
+                                                              {kTel, "0-52-123-45", true},
+                                                              {kTel, "אין", true},
+                                                              {kZip, "1234567", false},
+                                                              {kZip, "123456", true},
+                                                              {kZip, "3100", true},
+                                                              {kName, "א €₪\"'", false},
+                                                              {kName, "é", true},
+                                                              {kName, "\xC3\x99", true},
+                                                              {kName, "א\x7F", true}};
   std::vector<AccountRow> rows;
   std::set<int64_t> expected, found;
   for (const auto& [field, value, bad] : cases) {
@@ -124,6 +144,38 @@ TEST_F(PreflightTest, TelephonesZipsAndCharacters) {
   }
   for (const Finding& f : Check(rows, 1).findings) found.insert(f.row);
   EXPECT_EQ(found, expected);
+}
+
+// Regression: a weight of "abc" went into every row and the checks found nothing, though the
+// post would refuse the file. The dispatch settings' columns of layout 0, the same on every
+// row, are checked once, as findings of every row; the courier layout does not carry them.
+TEST_F(PreflightTest, FixedColumnsAreCheckedOnceForEveryRow) {
+  const std::string db = BuildDb({kClean, With("2", &AccountRow::city, "עכו")});
+  const std::string huge(kWorkbookCellLength + 1, 'x');
+  const std::tuple<std::string, std::string, std::string, std::vector<RuleId>> cases[] = {
+      {"", "", "", {}},
+      {"רשום", "0.5", "כן", {}},
+      {"", "12", "", {}},
+      {"", "abc", "", {kWeightMalformed}},
+      {"", "0", "", {kWeightMalformed}},
+      {"", "-1", "", {kWeightMalformed}},
+      {"", "0,5", "", {kWeightMalformed}},
+      {"", ".5", "", {kWeightMalformed}},
+      {"א\tב", "", "", {kCharacter}},
+      {"", "", "Ж", {kCharacter}},
+      {huge, "", "", {kFixedTooLong}},
+  };
+  for (const auto& [service, weight, confirm, rules] : cases) {
+    SCOPED_TRACE(service.substr(0, 10) + "|" + weight + "|" + confirm);
+    const PostILSettings fixed{service, weight, confirm, "", 0, 0};
+    const PreflightResult r = RunPreflight(db, 0, panel, docTypes, "", seam, fixed);
+    EXPECT_EQ(Found(r), Rows(std::vector<int64_t>(rules.size(), 0), rules));
+    EXPECT_EQ(r.errors, static_cast<int64_t>(rules.size()));
+    if (!r.findings.empty()) {
+      EXPECT_EQ(FindingCells(r.findings[0])[1], "כל השורות");
+    }
+    EXPECT_TRUE(RunPreflight(db, 1, panel, docTypes, "", seam, fixed).findings.empty());
+  }
 }
 
 // With the address from the document header there is no zip to check; the rest reads the
